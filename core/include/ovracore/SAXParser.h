@@ -1,0 +1,74 @@
+// ovracore: a namespace-aware streaming XML parser (on expat).
+#pragma once
+
+#include <cstddef>
+#include <map>
+#include <memory>
+#include <optional>
+#include <utility>
+
+#include <ovracore/Strings.h>
+
+namespace ovracore {
+
+// Attributes of one element. Each keeps its namespace URI (empty for
+// unqualified attributes). Values are already decoded by the XML parser.
+class Attributes {
+ public:
+  using Key = std::pair<UTF8String, UTF8String>;  // (namespace URI, local name)
+
+  void Add(UTF8String namespaceURI, UTF8String localName, UTF8String value);
+  // The value of an attribute, or absent.
+  std::optional<UTF8String> Find(std::string_view localName, std::string_view namespaceURI = {}) const;
+  // The value of an attribute, or the empty string when it is absent.
+  UTF8String Get(std::string_view localName, std::string_view namespaceURI = {}) const;
+  bool Has(std::string_view localName, std::string_view namespaceURI = {}) const;
+  const std::map<Key, UTF8String>& All() const { return mValues; }
+  bool Empty() const { return mValues.empty(); }
+
+ private:
+  std::map<Key, UTF8String> mValues;
+};
+
+// Handlers derive from this class and override what they need. Elements
+// without a namespace are passed by the default StartElement/EndElement on
+// to StartElementNoNamespace/EndElementNoNamespace.
+class AbstractParseHandler {
+ public:
+  virtual ~AbstractParseHandler();
+
+  virtual void StartElement(const UTF8String& namespaceURI, const UTF8String& localName,
+                            const Attributes& attributes);
+  virtual void EndElement(const UTF8String& namespaceURI, const UTF8String& localName);
+  virtual void StartElementNoNamespace(const UTF8String& name, const Attributes& attributes);
+  virtual void EndElementNoNamespace(const UTF8String& name);
+  virtual void Characters(const UTF8String& text);
+  virtual void StartPrefixMapping(const UTF8String& prefix, const UTF8String& namespaceURI);
+  virtual void EndPrefixMapping(const UTF8String& prefix);
+};
+
+// Limits that end a parse with a failure instead of exhausting the process.
+// Documents with a DOCTYPE declaration are always refused (no entity tricks).
+struct ParserLimits {
+  std::size_t maxDepth = 512;
+  std::size_t maxChildrenPerElement = 0;  // 0: unlimited
+  std::size_t maxBytes = 256u * 1024u * 1024u;
+};
+
+class Parser {
+ public:
+  virtual ~Parser();
+  // Parses a whole document. Returns false on malformed XML, a refused
+  // construct or an exceeded limit; ErrorMessage() then says why. Events
+  // before the failure have been delivered. A parser parses one document.
+  virtual bool ParseBuffer(const char* data, std::size_t length) = 0;
+  bool ParseBuffer(std::string_view text) { return ParseBuffer(text.data(), text.size()); }
+  virtual bool ParseFile(const UTF16String& path) = 0;
+  virtual UTF8String ErrorMessage() const = 0;
+};
+
+// The handler must outlive the parser.
+std::unique_ptr<Parser> GetParserWithNamespaceSupport(AbstractParseHandler& handler,
+                                                      const ParserLimits& limits = {});
+
+}  // namespace ovracore

@@ -1,0 +1,33 @@
+// Helpers shared by every test program.
+#pragma once
+
+#include <filesystem>
+#include <string>
+
+namespace ovratest {
+
+// A fresh folder below the test run's private temporary root, removed with
+// its contents when the object goes away.
+class TempDir {
+ public:
+  TempDir();
+  ~TempDir();
+  TempDir(const TempDir&) = delete;
+  TempDir& operator=(const TempDir&) = delete;
+  const std::filesystem::path& path() const { return mPath; }
+  std::filesystem::path operator/(const std::string& name) const { return mPath / name; }
+
+ private:
+  std::filesystem::path mPath;
+};
+
+// The temporary root of this test process (its user and local data roots
+// live below it).
+const std::filesystem::path& TestRoot();
+
+std::string ReadFile(const std::filesystem::path& path);
+void WriteFile(const std::filesystem::path& path, const std::string& contents);
+// The folder of checked-in test inputs (tests/data).
+std::filesystem::path DataDir();
+
+}  // namespace ovratest
