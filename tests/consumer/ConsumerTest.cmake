@@ -1,0 +1,11 @@
+# Installs the library into a staging folder, builds the consumer project
+# against it with find_package and runs it.
+set(OVRA_STAGE ${CMAKE_BINARY_DIR}/consumer-stage)
+add_test(NAME Consumer.FindPackageAndRun
+  COMMAND ${CMAKE_COMMAND}
+    -DBUILD_DIR=${CMAKE_BINARY_DIR}
+    -DSTAGE=${OVRA_STAGE}
+    -DSOURCE=${CMAKE_CURRENT_SOURCE_DIR}/consumer
+    -DGENERATOR=${CMAKE_GENERATOR}
+    -P ${CMAKE_CURRENT_SOURCE_DIR}/consumer/RunConsumer.cmake)
+set_tests_properties(Consumer.FindPackageAndRun PROPERTIES TIMEOUT 600)

@@ -1,0 +1,32 @@
+file(REMOVE_RECURSE ${STAGE})
+execute_process(COMMAND ${CMAKE_COMMAND} --install ${BUILD_DIR} --prefix ${STAGE}/usr
+  RESULT_VARIABLE rc)
+if(rc)
+  message(FATAL_ERROR "install failed")
+endif()
+execute_process(COMMAND ${CMAKE_COMMAND} -S ${SOURCE} -B ${STAGE}/build -G ${GENERATOR}
+  -DCMAKE_PREFIX_PATH=${STAGE}/usr RESULT_VARIABLE rc)
+if(rc)
+  message(FATAL_ERROR "configuring the consumer failed")
+endif()
+execute_process(COMMAND ${CMAKE_COMMAND} --build ${STAGE}/build RESULT_VARIABLE rc)
+if(rc)
+  message(FATAL_ERROR "building the consumer failed")
+endif()
+file(MAKE_DIRECTORY ${STAGE}/user ${STAGE}/local)
+execute_process(COMMAND ${CMAKE_COMMAND} -E env
+  OVRAMETADATA_USER_ROOT=${STAGE}/user OVRAMETADATA_LOCAL_ROOT=${STAGE}/local
+  ${STAGE}/build/consumer RESULT_VARIABLE rc)
+if(rc)
+  message(FATAL_ERROR "the consumer failed: ${rc}")
+endif()
+
+# The pkg-config file must describe the installed library too.
+find_program(PKG_CONFIG pkg-config)
+if(PKG_CONFIG)
+  execute_process(COMMAND ${CMAKE_COMMAND} -E env PKG_CONFIG_PATH=${STAGE}/usr/lib/pkgconfig:${STAGE}/usr/lib/x86_64-linux-gnu/pkgconfig
+    ${PKG_CONFIG} --libs ovrametadata OUTPUT_VARIABLE libs RESULT_VARIABLE rc)
+  if(rc OR NOT libs MATCHES "-lovrametadata")
+    message(FATAL_ERROR "pkg-config does not find ovrametadata: ${libs}")
+  endif()
+endif()
