@@ -1,0 +1,116 @@
+// Start and stop, packet handles and the namespace registry.
+#include <string>
+
+#include <gtest/gtest.h>
+
+#include <ovraxmp/XMPToolkit.h>
+
+using namespace ovraxmp;
+
+TEST(XMPStartup, InitializeIsCountedAndTerminateOfExtraHoldsKeepsToolkitUp) {
+  ASSERT_TRUE(XMPMeta::Initialize());
+  ASSERT_TRUE(XMPFiles::Initialize("/elsewhere"));
+  XMPFiles::Terminate();
+  XMPMeta::Terminate();
+  // The environment still holds one start: the toolkit must still work.
+  std::string prefix;
+  EXPECT_TRUE(XMPMeta::GetNamespacePrefix(kXMP_NS_DC, &prefix));
+  EXPECT_EQ(prefix, "dc:");
+  EXPECT_EQ(XMPFiles::GetPluginFolder(), "/nonexistent/plugins");
+  XMPMeta meta;
+  EXPECT_NE(meta.GetInternalRef(), nullptr);
+}
+
+TEST(XMPStartup, VersionTextNamesTheCoreAndClientNameIsKept) {
+  EXPECT_NE(XMPMeta::GetVersionInfo().find("XMP Core"), std::string::npos);
+  EXPECT_EQ(XMPMeta::GetClientName(), "ovraxmp tests");
+}
+
+TEST(XMPPacketHandle, PacketLivesUntilItsLastReference) {
+  XMPMetaRef ref = nullptr;
+  {
+    XMPMeta owner;
+    ref = owner.GetInternalRef();
+    EXPECT_EQ(XMPMetaRefGetCount(ref), 1);
+    XMPMetaRefAddRef(ref);
+    XMPMeta second(ref);
+    XMPMeta third(second);
+    EXPECT_EQ(XMPMetaRefGetCount(ref), 4);
+    XMPMeta moved(std::move(third));
+    EXPECT_EQ(third.GetInternalRef(), nullptr);
+    EXPECT_EQ(XMPMetaRefGetCount(ref), 4);
+    XMPMeta other;
+    other = second;
+    EXPECT_EQ(XMPMetaRefGetCount(ref), 5);
+    EXPECT_EQ(other.GetInternalRef(), ref);
+  }
+  EXPECT_EQ(XMPMetaRefGetCount(ref), 1);
+  XMPMetaRefRelease(ref);  // the last one; the sanitizer build checks the free
+}
+
+TEST(XMPPacketHandle, NullHandleMeansNoPacket) {
+  XMPMetaRefAddRef(nullptr);
+  XMPMetaRefRelease(nullptr);
+  XMPMeta none(nullptr);
+  EXPECT_EQ(none.GetInternalRef(), nullptr);
+  EXPECT_EQ(XMPMetaRefGetCount(nullptr), 0);
+  XMPMeta copy(none);
+  EXPECT_EQ(copy.GetInternalRef(), nullptr);
+}
+
+TEST(XMPError, CarriesIdAndReadableMessage) {
+  const XMP_Error withText(kXMPErr_BadSchema, "no such namespace");
+  EXPECT_EQ(withText.GetID(), -101);
+  EXPECT_STREQ(withText.GetErrMsg(), "no such namespace");
+  EXPECT_STREQ(withText.what(), "no such namespace");
+  const XMP_Error standard(kXMPErr_BadParse, "");
+  EXPECT_EQ(standard.GetID(), -106);
+  EXPECT_STREQ(standard.what(), "XMP parsing failure");
+}
+
+TEST(XMPNamespaces, RegisterAnswersWhetherTheSuggestedPrefixWasGiven) {
+  std::string registered;
+  EXPECT_TRUE(XMPMeta::RegisterNamespace("http://ovra.test/ns/one/", "ovone", &registered));
+  EXPECT_EQ(registered, "ovone:");
+  // Registering again with the same prefix (with colon this time) is fine.
+  EXPECT_TRUE(XMPMeta::RegisterNamespace("http://ovra.test/ns/one/", "ovone:", &registered));
+  EXPECT_EQ(registered, "ovone:");
+  // A taken prefix: registered under a generated prefix, answer false.
+  EXPECT_FALSE(XMPMeta::RegisterNamespace("http://ovra.test/ns/two/", "ovone", &registered));
+  EXPECT_NE(registered, "ovone:");
+  EXPECT_EQ(registered.back(), ':');
+  std::string uri;
+  EXPECT_TRUE(XMPMeta::GetNamespaceURI(registered, &uri));
+  EXPECT_EQ(uri, "http://ovra.test/ns/two/");
+  // A namespace that already has another prefix keeps it.
+  EXPECT_FALSE(XMPMeta::RegisterNamespace(kXMP_NS_DC, "dublin", &registered));
+  EXPECT_EQ(registered, "dc:");
+  EXPECT_FALSE(XMPMeta::RegisterNamespace(kXMP_NS_DC, "dublin", nullptr));
+}
+
+TEST(XMPNamespaces, BadArgumentsRaiseBadParam) {
+  for (const char* prefix : {"", "1abc", "a b", ":"}) {
+    try {
+      XMPMeta::RegisterNamespace("http://ovra.test/ns/bad/", prefix, nullptr);
+      ADD_FAILURE() << "accepted prefix \"" << prefix << "\"";
+    } catch (const XMP_Error& e) {
+      EXPECT_EQ(e.GetID(), kXMPErr_BadParam);
+    }
+  }
+  EXPECT_THROW(XMPMeta::RegisterNamespace("", "ovempty", nullptr), XMP_Error);
+}
+
+TEST(XMPNamespaces, LookupsAnswerFalseForUnknownAndAcceptPrefixWithOrWithoutColon) {
+  std::string text = "untouched";
+  EXPECT_FALSE(XMPMeta::GetNamespacePrefix("http://ovra.test/never/registered/", &text));
+  EXPECT_EQ(text, "untouched");
+  EXPECT_FALSE(XMPMeta::GetNamespaceURI("ovneverused", &text));
+  EXPECT_FALSE(XMPMeta::GetNamespaceURI("", &text));
+  EXPECT_EQ(text, "untouched");
+  EXPECT_TRUE(XMPMeta::GetNamespaceURI("xmp", &text));
+  EXPECT_EQ(text, kXMP_NS_XMP);
+  EXPECT_TRUE(XMPMeta::GetNamespaceURI("xmpMM:", &text));
+  EXPECT_EQ(text, kXMP_NS_XMP_MM);
+  EXPECT_TRUE(XMPMeta::GetNamespacePrefix(kXMP_NS_Transient, &text));
+  EXPECT_EQ(text, "xmpx:");
+}

@@ -1,0 +1,7 @@
+// ovraxmp: the XMP toolkit layer, everything at once.
+#pragma once
+
+#include <ovraxmp/XMPConsts.h>
+#include <ovraxmp/XMPError.h>
+#include <ovraxmp/XMPFiles.h>
+#include <ovraxmp/XMPMeta.h>

@@ -1,0 +1,72 @@
+// Not part of the interface: the packet object behind XMPMetaRef and the
+// helpers that every source of the layer shares.
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+#include <map>
+#include <set>
+#include <string>
+
+#include <exempi/xmp.h>
+
+#include <ovrametadata/XMPMetaRef.h>
+#include <ovraxmp/XMPError.h>
+
+namespace ovraxmp {
+
+// One packet: the toolkit object, its reference count and the in-memory
+// multi-value marks (namespace URI -> normalised property paths).
+class XMPPacket {
+ public:
+  explicit XMPPacket(XmpPtr xmp) noexcept : mXmp(xmp) {}
+  ~XMPPacket() {
+    if (mXmp) xmp_free(mXmp);
+  }
+  XMPPacket(const XMPPacket&) = delete;
+  XMPPacket& operator=(const XMPPacket&) = delete;
+
+  XmpPtr Xmp() const { return mXmp; }
+  void AddRef() noexcept { mRefCount.fetch_add(1, std::memory_order_relaxed); }
+  // True when this was the last reference (the caller deletes the packet).
+  bool Release() noexcept { return mRefCount.fetch_sub(1, std::memory_order_acq_rel) == 1; }
+  std::int32_t RefCount() const noexcept { return mRefCount.load(std::memory_order_relaxed); }
+
+  std::map<std::string, std::set<std::string>>& Marks() { return mMarks; }
+
+ private:
+  XmpPtr mXmp;
+  std::atomic<std::int32_t> mRefCount{1};
+  std::map<std::string, std::set<std::string>> mMarks;
+};
+
+namespace detail {
+
+// Owner of a toolkit string.
+class XmpString {
+ public:
+  XmpString() : mStr(xmp_string_new()) {}
+  ~XmpString() { xmp_string_free(mStr); }
+  XmpString(const XmpString&) = delete;
+  XmpString& operator=(const XmpString&) = delete;
+  XmpStringPtr get() const { return mStr; }
+  operator XmpStringPtr() const { return mStr; }
+  std::string str() const { return std::string(xmp_string_cstr(mStr), xmp_string_len(mStr)); }
+
+ private:
+  XmpStringPtr mStr;
+};
+
+// Throws XMP_Error with the toolkit's last error id (fallbackId when the
+// toolkit recorded none) and the standard text, prefixed by context.
+[[noreturn]] void ThrowLastError(std::int32_t fallbackId, const std::string& context);
+[[noreturn]] void Throw(std::int32_t id, const std::string& context);
+
+// Starts the toolkit when nobody has yet (for clients that skip Initialize).
+void EnsureStarted();
+
+// Creates a packet with one reference; throws when the toolkit cannot.
+XMPPacket* NewPacket(XmpPtr xmp);
+
+}  // namespace detail
+}  // namespace ovraxmp
