@@ -27,9 +27,12 @@ using AssertionReporter = std::function<void(const AssertionInfo&)>;
 void SetAssertionReporter(AssertionReporter reporter);
 void SetAssertionsEnabled(bool enabled);
 bool AssertionsEnabled();
+// With the debug value "BreakOnAssertion" set to "true" and a debugger
+// attached, an assertion also stops in the debugger.
 void RaiseAssertion(const AssertionInfo& info);
 
-// Start-up time marks: category + text + time since the first mark.
+// Start-up time marks: category + text + time since the first mark (the
+// first mark after ClearTimeMarks starts the clock again).
 struct TimeMark {
   UTF8String category;
   UTF8String text;
@@ -42,6 +45,6 @@ void ClearTimeMarks();
 // The client's name as the host configured it ("ovrametadata" by default);
 // the toolkit records it as the software agent of saves.
 UTF8String SuiteClientName();
-void SetSuiteClientName(std::string_view name);
+void SetSuiteClientName(std::string_view name);  // empty: back to the default
 
 }  // namespace ovracore

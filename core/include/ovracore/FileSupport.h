@@ -66,14 +66,17 @@ class Dir {
 
 // The per-user and machine-wide data roots. On Linux: $XDG_DATA_HOME (default
 // ~/.local/share) and /usr/local/share; OVRAMETADATA_USER_ROOT and
-// OVRAMETADATA_LOCAL_ROOT override them. Throws DirectoryException with
+// OVRAMETADATA_LOCAL_ROOT override them; an override that is set but empty,
+// or no HOME for the user root, means there is no root. Neither creates the
+// folder. Throws DirectoryException with
 // "$$$/ovracore/filesupport/DirCommonFiles=Could not find the common files directory."
 // when no root can be determined.
 Dir ApplicationSupportFolder_User();
 Dir ApplicationSupportFolder_Local();
 
 // The application's plug-in folder: set by the host, by default a folder
-// "plugins" beside the running library.
+// "plugins" beside the running library (the module this code is linked
+// into). An empty path restores that default.
 Dir PluginsFolder();
 void SetPluginsFolder(const UTF16String& path);
 
@@ -90,6 +93,9 @@ std::optional<std::string> ReadFileToString(const UTF16String& path,
 bool SimpleWriteStringToFile(const File& file, std::string_view contents);
 // Writes a temporary file in the target's folder, flushes it and renames it
 // over the target, so that the target is either the old or the new content.
+// A new file gets the permissions the umask allows, a replaced one keeps its
+// own; a link is followed. On failure the temporary file is removed and the
+// target is untouched.
 bool SafeSave(const UTF16String& path, std::string_view contents);
 
 }  // namespace filesupport

@@ -31,15 +31,19 @@ std::optional<std::uint8_t> ToUInt8(std::string_view text);  // values above 255
 // 0 when there is none.
 double CoerceToDouble(std::string_view text);
 
-// Number to text with a fixed count of decimals in the C locale, rounded half
-// away from zero; trailing zeros are kept ("2.50" for 2.5 with 2 decimals).
-// Negative zero is written as "0".
+// Number to text with a fixed count of decimals in the C locale (whatever the
+// process locale is), rounded half away from zero on the shortest decimal
+// form of the double, so 2.675 gives "2.68" although its binary value is a
+// little below; trailing zeros are kept ("2.50" for 2.5 with 2 decimals).
+// A result that rounds to zero has no sign ("-0.001" -> "0.00"). NaN and
+// infinities are "nan", "inf" and "-inf".
 UTF8String NumberToString(double value, unsigned decimals);
 UTF16String NumberToUTF16String(double value, unsigned decimals);
 
 // Splits text at every character that occurs in separators. With
 // keepEmpty, adjacent separators yield empty tokens ("a//b" -> a, "", b);
 // without, runs of separators count as one and empty tokens are dropped.
+// An empty text gives one empty token with keepEmpty, none without.
 std::vector<UTF8String> Tokenize(std::string_view text, std::string_view separators,
                                  bool keepEmpty = true);
 
