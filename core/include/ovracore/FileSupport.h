@@ -27,6 +27,8 @@ class File {
   File() = default;
   explicit File(const UTF16String& path);
   explicit File(std::filesystem::path path);
+  // Literals such as u"clip.mov" would fit both forms above.
+  explicit File(const char16_t* path) : File(UTF16String(path)) {}
 
   bool Exists() const;                 // a regular file (or a link to one)
   UTF16String FullPath() const;        // absolute, lexically normalised
@@ -46,6 +48,7 @@ class Dir {
   Dir() = default;
   explicit Dir(const UTF16String& path);
   explicit Dir(std::filesystem::path path);
+  explicit Dir(const char16_t* path) : Dir(UTF16String(path)) {}
 
   bool Exists() const;
   UTF16String FullPath() const;

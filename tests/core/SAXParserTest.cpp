@@ -1,0 +1,214 @@
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include <ovracore/SAXParser.h>
+
+#include "TestSupport.h"
+
+using namespace ovracore;
+
+namespace {
+
+// Records every event as one line, the way a reader of the document would
+// list them.
+class Recorder : public AbstractParseHandler {
+ public:
+  std::vector<std::string> events;
+
+  void StartElement(const UTF8String& ns, const UTF8String& local, const Attributes& attrs) override {
+    std::string line = "start {" + ns + "}" + local;
+    for (const auto& [key, value] : attrs.All()) line += " {" + key.first + "}" + key.second + "=" + value;
+    events.push_back(line);
+    AbstractParseHandler::StartElement(ns, local, attrs);  // routes unqualified ones
+  }
+  void EndElement(const UTF8String& ns, const UTF8String& local) override {
+    events.push_back("end {" + ns + "}" + local);
+    AbstractParseHandler::EndElement(ns, local);
+  }
+  void StartElementNoNamespace(const UTF8String& name, const Attributes& attrs) override {
+    events.push_back("plain-start " + name + " " + std::to_string(attrs.All().size()));
+  }
+  void EndElementNoNamespace(const UTF8String& name) override { events.push_back("plain-end " + name); }
+  void Characters(const UTF8String& text) override { events.push_back("text " + text); }
+  void StartPrefixMapping(const UTF8String& prefix, const UTF8String& uri) override {
+    events.push_back("map " + prefix + "=" + uri);
+  }
+  void EndPrefixMapping(const UTF8String& prefix) override { events.push_back("unmap " + prefix); }
+};
+
+bool Parse(AbstractParseHandler& handler, std::string_view xml, std::string* error = nullptr,
+           const ParserLimits& limits = {}) {
+  const std::unique_ptr<Parser> parser = GetParserWithNamespaceSupport(handler, limits);
+  const bool ok = parser->ParseBuffer(xml);
+  if (error) *error = parser->ErrorMessage();
+  return ok;
+}
+
+std::string Nested(int depth) {
+  std::string xml;
+  for (int i = 0; i < depth; ++i) xml += "<a>";
+  for (int i = 0; i < depth; ++i) xml += "</a>";
+  return xml;
+}
+
+}  // namespace
+
+TEST(SAXParser, NamespacesPrefixEventsAndAttributes) {
+  Recorder r;
+  ASSERT_TRUE(Parse(r,
+                    "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n"
+                    "<ui:views xmlns:ui=\"urn:ui\" xmlns=\"urn:default\" ui:name=\"v\" plain=\"&lt;1&gt;\">"
+                    "<item/>"
+                    "<x:item xmlns:x=\"urn:x\" x:k=\"&#233;\"/>"
+                    "</ui:views>"));
+  EXPECT_EQ(r.events, (std::vector<std::string>{
+                          "map ui=urn:ui",
+                          "map =urn:default",
+                          "start {urn:ui}views {}plain=<1> {urn:ui}name=v",
+                          "start {urn:default}item",
+                          "end {urn:default}item",
+                          "map x=urn:x",
+                          "start {urn:x}item {urn:x}k=\xC3\xA9",
+                          "end {urn:x}item",
+                          "unmap x",
+                          "end {urn:ui}views",
+                          "unmap ",  // mappings end in reverse order
+                          "unmap ui",
+                      }));
+}
+
+TEST(SAXParser, UnqualifiedElementsReachNoNamespaceHandlersAndTextComesWhole) {
+  Recorder r;
+  ASSERT_TRUE(Parse(r, "<xmp_definitions><xmp_schema a=\"1\" b=\"2\">line1\nline2 &amp; more</xmp_schema>"
+                       "<u:sep xmlns:u=\"urn:u\"/></xmp_definitions>"));
+  EXPECT_EQ(r.events, (std::vector<std::string>{
+                          "start {}xmp_definitions",
+                          "plain-start xmp_definitions 0",
+                          "start {}xmp_schema {}a=1 {}b=2",
+                          "plain-start xmp_schema 2",
+                          "text line1\nline2 & more",
+                          "end {}xmp_schema",
+                          "plain-end xmp_schema",
+                          "map u=urn:u",
+                          "start {urn:u}sep",
+                          "end {urn:u}sep",
+                          "unmap u",
+                          "end {}xmp_definitions",
+                          "plain-end xmp_definitions",
+                      }));
+}
+
+TEST(SAXParser, AttributeLookupKeepsNamespaces) {
+  struct Grab : AbstractParseHandler {
+    Attributes attrs;
+    void StartElement(const UTF8String&, const UTF8String&, const Attributes& a) override { attrs = a; }
+  } g;
+  ASSERT_TRUE(Parse(g, "<r xmlns:p=\"urn:p\" name=\"plain\" p:name=\"qualified\"/>"));
+  EXPECT_EQ(g.attrs.Get("name"), "plain");
+  EXPECT_EQ(g.attrs.Get("name", "urn:p"), "qualified");
+  EXPECT_FALSE(g.attrs.Find("name", "urn:other"));
+  EXPECT_TRUE(g.attrs.Has("name", "urn:p"));
+  EXPECT_EQ(g.attrs.Get("missing"), "");
+}
+
+TEST(SAXParser, MalformedDocumentsFailAfterDeliveringEarlierEvents) {
+  for (const char* bad : {"<a><b></a>", "<a>", "", "just text", "<a x=\"1\" x=\"2\"/>", "<p:a/>",
+                          "<a/><b/>", "<a>&undefined;</a>", "<a>\xFF</a>"}) {
+    Recorder r;
+    std::string error;
+    EXPECT_FALSE(Parse(r, bad, &error)) << bad;
+    EXPECT_FALSE(error.empty()) << bad;
+  }
+  Recorder r;
+  EXPECT_FALSE(Parse(r, "<a><b/><c></a>"));
+  ASSERT_GE(r.events.size(), 3u);
+  EXPECT_EQ(r.events[2], "start {}b");
+}
+
+TEST(SAXParser, DoctypeAndEntityAttacksAreRefused) {
+  const std::string laughs =
+      "<?xml version=\"1.0\"?><!DOCTYPE lolz [<!ENTITY lol \"lol\">"
+      "<!ENTITY lol1 \"&lol;&lol;&lol;&lol;&lol;&lol;&lol;&lol;&lol;&lol;\">"
+      "<!ENTITY lol2 \"&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;\">"
+      "<!ENTITY lol3 \"&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;\">"
+      "<!ENTITY lol4 \"&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;\">"
+      "<!ENTITY lol5 \"&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;\">"
+      "<!ENTITY lol6 \"&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;\">"
+      "<!ENTITY lol7 \"&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;\">"
+      "<!ENTITY lol8 \"&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;\">"
+      "<!ENTITY lol9 \"&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;\">"
+      "]><lolz>&lol9;</lolz>";
+  const std::string external =
+      "<!DOCTYPE r [<!ENTITY secret SYSTEM \"file:///etc/passwd\">]><r>&secret;</r>";
+  const std::string plainDoctype = "<!DOCTYPE r><r/>";
+  for (const std::string& xml : {laughs, external, plainDoctype}) {
+    Recorder r;
+    std::string error;
+    EXPECT_FALSE(Parse(r, xml, &error));
+    EXPECT_NE(error.find("document type"), std::string::npos) << error;
+    EXPECT_TRUE(r.events.empty());
+  }
+}
+
+TEST(SAXParser, DepthChildrenAndSizeLimits) {
+  Recorder r1;
+  EXPECT_TRUE(Parse(r1, Nested(512)));
+  Recorder r2;
+  std::string error;
+  EXPECT_FALSE(Parse(r2, Nested(513), &error));
+  EXPECT_NE(error.find("nested"), std::string::npos) << error;
+  Recorder r3;
+  EXPECT_FALSE(Parse(r3, Nested(200000)));
+
+  ParserLimits few;
+  few.maxChildrenPerElement = 3;
+  Recorder r4;
+  EXPECT_TRUE(Parse(r4, "<r><a/><b><x/><y/><z/></b><c/></r>", nullptr, few));
+  Recorder r5;
+  EXPECT_FALSE(Parse(r5, "<r><a/><b/><c/><d/></r>", &error, few));
+  EXPECT_NE(error.find("children"), std::string::npos) << error;
+
+  ParserLimits small;
+  small.maxBytes = 17;
+  Recorder r6;
+  EXPECT_TRUE(Parse(r6, "<r>0123456789</r>", nullptr, small));
+  Recorder r7;
+  EXPECT_FALSE(Parse(r7, "<r>0123456789 </r>", nullptr, small));
+}
+
+TEST(SAXParser, HandlerExceptionEndsParseWithFailure) {
+  struct Throwing : Recorder {
+    void StartElementNoNamespace(const UTF8String& name, const Attributes&) override {
+      if (name == "boom") throw std::runtime_error("no boom allowed");
+      events.push_back("plain-start " + name);
+    }
+  } t;
+  std::string error;
+  EXPECT_FALSE(Parse(t, "<r><boom/><after/></r>", &error));
+  EXPECT_NE(error.find("no boom allowed"), std::string::npos) << error;
+  for (const std::string& e : t.events) EXPECT_EQ(e.find("after"), std::string::npos) << e;
+}
+
+TEST(SAXParser, ParsesFilesAndOnlyOneDocument) {
+  ovratest::TempDir dir;
+  // UTF-16 with a byte order mark: expat converts it to UTF-8 for us.
+  std::string utf16 = "\xFF\xFE";
+  for (char c : std::string("<r a=\"1\">\xE9</r>")) {
+    utf16.push_back(c);
+    utf16.push_back('\0');
+  }
+  ovratest::WriteFile(dir / "doc.xml", utf16);
+  Recorder r;
+  const std::unique_ptr<Parser> parser = GetParserWithNamespaceSupport(r);
+  ASSERT_TRUE(parser->ParseFile(ToUTF16((dir / "doc.xml").string()))) << parser->ErrorMessage();
+  EXPECT_EQ(r.events[2], "text \xC3\xA9");
+  EXPECT_FALSE(parser->ParseBuffer("<r/>"));
+
+  Recorder missing;
+  const std::unique_ptr<Parser> other = GetParserWithNamespaceSupport(missing);
+  EXPECT_FALSE(other->ParseFile(ToUTF16((dir / "absent.xml").string())));
+  EXPECT_FALSE(other->ErrorMessage().empty());
+}
