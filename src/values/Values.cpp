@@ -1,0 +1,423 @@
+// Typed reading and writing of values at a Path: the storage forms, the
+// generic read and write procedures and the text reader's validation.
+#include <ovrametadata/Values.h>
+
+#include <algorithm>
+#include <cstdint>
+#include <exception>
+#include <utility>
+
+#include <boost/optional.hpp>
+
+#include <ovracore/Localizer.h>
+#include <ovracore/Strings.h>
+#include <ovraxmp/XMPToolkit.h>
+#include <ovrametadata/Format.h>
+#include <ovrametadata/Initialize.h>
+
+#include "paths/PathsInternal.h"
+
+namespace ovrametadata {
+
+namespace {
+
+using ovraxmp::XMPMeta;
+using ovraxmp::XMPUtils;
+
+const char kArraySeparator[] = "; ";
+const char kArrayQuotes[] = "\"";
+const char kDefaultLanguage[] = "x-default";
+const char kDateTypeId[] = "date";
+
+void SetResult(GetValueResult* result, GetValueResult value) {
+  if (result) *result = value;
+}
+
+// The URI is deliberately run into the path: that is how the message has
+// always shown the property.
+void ReportInvalidData(ErrorType type, const Path& path) {
+  SendError(type,
+            ovracore::ZString("$$$/ovrametadata/ErrorInXMPData/InvalidData=invalid data in "
+                              "#{quot}@0#{quot}.",
+                              {path.namespaceURI + path.description}),
+            UTF16String());
+}
+
+bool IsDateEntry(const EntryDefinition& entry) {
+  return entry.type && *entry.type == kDateTypeId;
+}
+
+// ---- Storage forms ----
+// Each has a reader (false when nothing could be read) and a writer; both
+// throw the toolkit's error on failure.
+
+struct SimpleText {
+  bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
+    return meta.GetProperty(path.namespaceURI, path.description, &out);
+  }
+  void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
+    meta.SetProperty(path.namespaceURI, path.description, value);
+  }
+};
+
+struct ArrayText {
+  bool ordered;
+  ovraxmp::XMP_OptionBits Options() const {
+    return ordered ? ovraxmp::kXMP_PropArrayIsOrdered : ovraxmp::kXMP_NoOptions;
+  }
+  bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
+    XMPUtils::CatenateArrayItems(meta, path.namespaceURI, path.description, kArraySeparator,
+                                 kArrayQuotes, Options(), &out);
+    return true;
+  }
+  void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
+    XMPUtils::SeparateArrayItems(&meta, path.namespaceURI, path.description, Options(), value);
+  }
+};
+
+struct AltText {
+  bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
+    std::string actualLanguage;
+    return meta.GetLocalizedText(path.namespaceURI, path.description, std::string(),
+                                 kDefaultLanguage, &actualLanguage, &out);
+  }
+  void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
+    meta.SetLocalizedText(path.namespaceURI, path.description, std::string(), kDefaultLanguage,
+                          value);
+  }
+};
+
+// Read as text and normalised through the toolkit's date conversion.
+struct DateText {
+  bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
+    std::string stored;
+    if (!meta.GetProperty(path.namespaceURI, path.description, &stored)) return false;
+    ovraxmp::XMP_DateTime dateTime;
+    XMPUtils::ConvertToDate(stored, &dateTime);
+    XMPUtils::ConvertFromDate(dateTime, &out);
+    return true;
+  }
+  void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
+    ovraxmp::XMP_DateTime dateTime;
+    XMPUtils::ConvertToDate(value, &dateTime);
+    meta.SetProperty_Date(path.namespaceURI, path.description, dateTime);
+  }
+};
+
+struct BoolValue {
+  bool Read(const XMPMeta& meta, const Path& path, bool& out) const {
+    return meta.GetProperty_Bool(path.namespaceURI, path.description, &out);
+  }
+  void Write(XMPMeta& meta, const Path& path, bool value) const {
+    meta.SetProperty_Bool(path.namespaceURI, path.description, value);
+  }
+};
+
+struct IntValue {
+  bool Read(const XMPMeta& meta, const Path& path, int& out) const {
+    std::int32_t value = 0;
+    if (!meta.GetProperty_Int(path.namespaceURI, path.description, &value)) return false;
+    out = value;
+    return true;
+  }
+  void Write(XMPMeta& meta, const Path& path, int value) const {
+    meta.SetProperty_Int(path.namespaceURI, path.description, value);
+  }
+};
+
+struct Int64Value {
+  bool Read(const XMPMeta& meta, const Path& path, long long& out) const {
+    std::int64_t value = 0;
+    if (!meta.GetProperty_Int64(path.namespaceURI, path.description, &value)) return false;
+    out = value;
+    return true;
+  }
+  void Write(XMPMeta& meta, const Path& path, long long value) const {
+    meta.SetProperty_Int64(path.namespaceURI, path.description, value);
+  }
+};
+
+struct DoubleValue {
+  bool Read(const XMPMeta& meta, const Path& path, double& out) const {
+    return meta.GetProperty_Float(path.namespaceURI, path.description, &out);
+  }
+  void Write(XMPMeta& meta, const Path& path, double value) const {
+    meta.SetProperty_Float(path.namespaceURI, path.description, value);
+  }
+};
+
+struct DateValue {
+  bool Read(const XMPMeta& meta, const Path& path, Date& out) const {
+    std::string stored;
+    if (!meta.GetProperty(path.namespaceURI, path.description, &stored)) return false;
+    ovraxmp::XMP_DateTime dateTime;
+    XMPUtils::ConvertToDate(stored, &dateTime);
+    XMPUtils::ConvertToUTCTime(&dateTime);
+    out.year = dateTime.year;
+    out.month = dateTime.month;
+    out.day = dateTime.day;
+    out.hour = dateTime.hour;
+    out.minute = dateTime.minute;
+    out.second = dateTime.second;
+    return true;
+  }
+};
+
+// ---- The generic procedures ----
+
+template <class T, class Storage>
+bool ReadValue(XMPMetaRef xmp, const Path& path, T& out, GetValueResult* result,
+               const Storage& storage) {
+  SetResult(result, ValueAbsent);
+  if (!xmp) return false;
+  try {
+    const XMPMeta meta(xmp);
+    if (meta.IsMultiValued(path.namespaceURI, path.description)) {
+      SetResult(result, ValueMixed);
+      return false;
+    }
+    if (!meta.DoesPropertyExist(path.namespaceURI, path.description)) return false;
+    T value{};
+    if (!storage.Read(meta, path, value)) return false;
+    out = std::move(value);
+    SetResult(result, ValueFound);
+    return true;
+  } catch (...) {
+    // Toolkit errors and anything else alike: the data cannot be read.
+    ReportInvalidData(kErrorReadingXMP, path);
+    SetResult(result, ValueError);
+    return false;
+  }
+}
+
+// Typed values differ unless both sides were read and are equal.
+template <class T>
+bool Differs(const boost::optional<T>& old, const T& value) {
+  return !old || !(*old == value);
+}
+
+// An absent text only differs from a non-empty one, so clearing a missing
+// property writes nothing.
+bool Differs(const boost::optional<UTF8String>& old, const UTF8String& value) {
+  return old ? *old != value : !value.empty();
+}
+
+template <class T>
+bool SameAsWritten(const T& readBack, const T& written) {
+  return readBack == written;
+}
+
+// The toolkit re-spaces array items; that is not a difference.
+bool SameAsWritten(const UTF8String& readBack, const UTF8String& written) {
+  auto withoutSpaces = [](UTF8String text) {
+    text.erase(std::remove(text.begin(), text.end(), ' '), text.end());
+    return text;
+  };
+  return withoutSpaces(readBack) == withoutSpaces(written);
+}
+
+template <class T, class Storage>
+boost::optional<T> ReadCurrent(const XMPMeta& meta, const Path& path, const Storage& storage) {
+  try {
+    if (!meta.DoesPropertyExist(path.namespaceURI, path.description)) return boost::none;
+    T value{};
+    if (storage.Read(meta, path, value)) return value;
+  } catch (const std::exception&) {
+    // Unreadable old data is simply replaced.
+  }
+  return boost::none;
+}
+
+template <class T, class Storage>
+bool WriteValue(XMPMetaRef xmp, const Path& path, const T& value, const Storage& storage) {
+  if (!xmp) return false;
+  bool written = false;
+  try {
+    XMPMeta meta(xmp);
+    const boost::optional<T> old = ReadCurrent<T>(meta, path, storage);
+    const bool multiValued = meta.IsMultiValued(path.namespaceURI, path.description);
+    if (!multiValued && !Differs(old, value)) return false;
+
+    storage.Write(meta, path, value);
+    written = true;
+
+    const boost::optional<T> readBack = ReadCurrent<T>(meta, path, storage);
+    if (!readBack || !SameAsWritten(*readBack, value)) ReportInvalidData(kErrorWritingXMP, path);
+
+    if (multiValued) meta.ClearMultiValueInfo(path.namespaceURI, path.description);
+    return true;
+  } catch (...) {
+    ReportInvalidData(kErrorWritingXMP, path);
+    return written;
+  }
+}
+
+// ---- The text reader's validation ----
+
+bool IsAmongChoices(const EntryDefinition& entry, const UTF8String& text) {
+  auto choices = &entry.constraints.choices;
+  // An entry of a named choice type may leave its values to the type.
+  boost::shared_ptr<TypeDefinition> type;
+  if (choices->empty() && entry.type) {
+    type = TypeIdDefinition(*entry.type);
+    if (type) choices = &type->constraints.choices;
+  }
+  return std::any_of(choices->begin(), choices->end(),
+                     [&](const boost::shared_ptr<ChoiceDefinition>& choice) {
+                       return choice && choice->rawValue == text;
+                     });
+}
+
+bool IsValidBooleanText(XMPMetaRef xmp, const Path& path, const UTF8String& text) {
+  bool value = false;
+  if (!ReadValue(xmp, path, value, nullptr, BoolValue())) return true;
+  if (value) return text == "1" || ovracore::EqualsIgnoreCaseASCII(text, "True");
+  return text == "0" || ovracore::EqualsIgnoreCaseASCII(text, "False");
+}
+
+bool IsValidIntegerText(XMPMetaRef xmp, const Path& path, const UTF8String& text) {
+  long long value = 0;
+  if (!ReadValue(xmp, path, value, nullptr, Int64Value())) return true;
+  std::string canonical;
+  XMPUtils::ConvertFromInt64(value, &canonical);
+  return canonical == text;
+}
+
+void ValidateText(XMPMetaRef xmp, const Path& path, const EntryDefinition& entry,
+                  const boost::optional<PrimitiveType>& primitive, const UTF8String& text) {
+  if (!primitive) return;
+  bool valid = true;
+  switch (*primitive) {
+    case kPrimitiveType_closedchoice:
+      valid = IsAmongChoices(entry, text);
+      break;
+    case kPrimitiveType_boolean:
+      valid = IsValidBooleanText(xmp, path, text);
+      break;
+    case kPrimitiveType_integer:
+      try {
+        valid = IsValidIntegerText(xmp, path, text);
+      } catch (const std::exception&) {
+        valid = false;
+      }
+      break;
+    default:
+      break;
+  }
+  if (!valid) ReportInvalidData(kErrorReadingXMP, path);
+}
+
+bool ReadStoredText(XMPMetaRef xmp, const Path& path, const boost::optional<PrimitiveType>& primitive,
+                    UTF8String& raw, GetValueResult* result) {
+  switch (*primitive) {
+    case kPrimitiveType_bag:
+      return ReadValue(xmp, path, raw, result, ArrayText{false});
+    case kPrimitiveType_seq:
+      return ReadValue(xmp, path, raw, result, ArrayText{true});
+    case kPrimitiveType_alt:
+      return ReadValue(xmp, path, raw, result, AltText());
+    default:
+      return ReadValue(xmp, path, raw, result, SimpleText());
+  }
+}
+
+}  // namespace
+
+// ---------------------------------------------------------------------------
+// Readers
+
+bool GetValue(XMPMetaRef xmp, const Path& path, bool& value, GetValueResult* result) {
+  return ReadValue(xmp, path, value, result, BoolValue());
+}
+
+bool GetValue(XMPMetaRef xmp, const Path& path, int& value, GetValueResult* result) {
+  return ReadValue(xmp, path, value, result, IntValue());
+}
+
+bool GetValue(XMPMetaRef xmp, const Path& path, long long& value, GetValueResult* result) {
+  return ReadValue(xmp, path, value, result, Int64Value());
+}
+
+bool GetValue(XMPMetaRef xmp, const Path& path, double& value, GetValueResult* result) {
+  return ReadValue(xmp, path, value, result, DoubleValue());
+}
+
+bool GetValue(XMPMetaRef xmp, const Path& path, Date& value, GetValueResult* result) {
+  SetResult(result, ValueAbsent);
+  const auto entry = PathEntryDefinition(path);
+  if (!entry) {
+    SetResult(result, ValueError);
+    return false;
+  }
+  if (!IsDateEntry(*entry)) return false;
+  return ReadValue(xmp, path, value, result, DateValue());
+}
+
+bool GetValue(XMPMetaRef xmp, const Path& path, UTF8String& value, GetValueResult* result) {
+  const auto entry = PathEntryDefinition(path);
+  if (!entry) {
+    SetResult(result, ValueError);
+    return false;
+  }
+  const auto primitive = detail::PrimitiveTypeOfEntry(*entry);
+
+  UTF8String raw;
+  bool read = IsDateEntry(*entry) && ReadValue(xmp, path, raw, result, DateText());
+  if (!read && primitive) read = ReadStoredText(xmp, path, primitive, raw, result);
+  if (!read) {
+    // Internal properties that are not stored may be constructed from others.
+    if (path.internal) return GetConstructedValue(xmp, path, value, result);
+    return false;
+  }
+
+  UTF8String text;
+  if (path.internal && !IsAllMetadataForcedWritable()) text = FormatValue(xmp, path, raw);
+  if (text.empty()) text = raw;
+  if (!text.empty()) ValidateText(xmp, path, *entry, primitive, text);
+  value = std::move(text);
+  return true;
+}
+
+bool GetRawStringValue(XMPMetaRef xmp, const Path& path, UTF8String& value,
+                       GetValueResult* result) {
+  return ReadValue(xmp, path, value, result, SimpleText());
+}
+
+// ---------------------------------------------------------------------------
+// Writers
+
+bool SetValue(XMPMetaRef xmp, const Path& path, bool value) {
+  return WriteValue(xmp, path, value, BoolValue());
+}
+
+bool SetValue(XMPMetaRef xmp, const Path& path, int value) {
+  return WriteValue(xmp, path, value, IntValue());
+}
+
+bool SetValue(XMPMetaRef xmp, const Path& path, long long value) {
+  return WriteValue(xmp, path, value, Int64Value());
+}
+
+bool SetValue(XMPMetaRef xmp, const Path& path, double value) {
+  return WriteValue(xmp, path, value, DoubleValue());
+}
+
+bool SetValue(XMPMetaRef xmp, const Path& path, const UTF8String& value) {
+  const auto entry = PathEntryDefinition(path);
+  if (!entry) return false;
+  if (IsDateEntry(*entry)) return WriteValue(xmp, path, value, DateText());
+  const auto primitive = detail::PrimitiveTypeOfEntry(*entry);
+  if (!xmp || !primitive) return false;
+  switch (*primitive) {
+    case kPrimitiveType_bag:
+      return WriteValue(xmp, path, value, ArrayText{false});
+    case kPrimitiveType_seq:
+      return WriteValue(xmp, path, value, ArrayText{true});
+    case kPrimitiveType_alt:
+      return WriteValue(xmp, path, value, AltText());
+    default:
+      return WriteValue(xmp, path, value, SimpleText());
+  }
+}
+
+}  // namespace ovrametadata
