@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 
 #include <ovracore/Diagnostics.h>
-#include <ovracore/Mutex.h>
 #include <ovracore/Resources.h>
 #include <ovracore/SharedFunctions.h>
 
@@ -112,11 +111,4 @@ TEST(SharedFunctionsList, EmptiedCallablesAreSkippedAndPurged) {
   EXPECT_EQ(list.Size(), 2u);  // the withdrawn entry went on registration
   list.DeleteEmptyFunctions();
   EXPECT_EQ(list.Size(), 1u);
-}
-
-TEST(RecursiveMutex, SameThreadMayLockAgain) {
-  RecursiveMutex mutex;
-  LockGuard<RecursiveMutex> outer(mutex);
-  EXPECT_TRUE(mutex.try_lock());
-  mutex.unlock();
 }
