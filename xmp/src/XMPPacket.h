@@ -27,12 +27,18 @@ class XMPPacket {
   XMPPacket& operator=(const XMPPacket&) = delete;
 
   XmpPtr Xmp() const { return mXmp; }
+  // Swaps in another toolkit object (which the packet then owns).
+  void ReplaceXmp(XmpPtr xmp) noexcept {
+    if (mXmp) xmp_free(mXmp);
+    mXmp = xmp;
+  }
   void AddRef() noexcept { mRefCount.fetch_add(1, std::memory_order_relaxed); }
   // True when this was the last reference (the caller deletes the packet).
   bool Release() noexcept { return mRefCount.fetch_sub(1, std::memory_order_acq_rel) == 1; }
   std::int32_t RefCount() const noexcept { return mRefCount.load(std::memory_order_relaxed); }
 
   std::map<std::string, std::set<std::string>>& Marks() { return mMarks; }
+  const std::map<std::string, std::set<std::string>>& Marks() const { return mMarks; }
 
  private:
   XmpPtr mXmp;
@@ -67,6 +73,21 @@ void EnsureStarted();
 
 // Creates a packet with one reference; throws when the toolkit cannot.
 XMPPacket* NewPacket(XmpPtr xmp);
+
+// True when the namespace is registered with the toolkit. Positive answers
+// are cached: registrations are never undone while the toolkit runs.
+bool NamespaceKnown(const std::string& namespaceURI);
+// The registered prefix with colon; throws kXMPErr_BadSchema when none.
+std::string RequirePrefix(const std::string& namespaceURI);
+// Forgets the cache (the toolkit stopped).
+void ForgetNamespaces();
+
+// The path without a leading "prefix:" of its own namespace, so that
+// "dc:title" and "title" name the same node in the multi-value marks.
+std::string NormalizedPath(const std::string& schemaNS, const std::string& path);
+
+// A packet that is not null, else kXMPErr_BadObject.
+XMPPacket& Require(XMPMetaRef ref);
 
 }  // namespace detail
 }  // namespace ovraxmp

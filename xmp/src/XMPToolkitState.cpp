@@ -71,6 +71,7 @@ void XMPMeta::Terminate() {
   if (sInitializationCount == 0) return;
   if (--sInitializationCount == 0 && sToolkitUp.load(std::memory_order_acquire)) {
     xmp_terminate();
+    detail::ForgetNamespaces();
     sToolkitUp.store(false, std::memory_order_release);
   }
 }

@@ -2,14 +2,51 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 #include <ovraxmp/XMPConsts.h>
 #include <ovraxmp/XMPError.h>
+#include <ovraxmp/XMPMeta.h>
 
 namespace ovraxmp {
 
+// One open media file. Paths are UTF-8. Standalone ".xmp" files are read
+// and written by the layer itself (parse; serialise and replace the file
+// safely), so a sidecar behaves like a media file. Not thread-safe; different
+// objects may be used on different threads.
 class XMPFiles {
  public:
+  XMPFiles() = default;
+  // Opens at once; throws XMP_Error "OpenFile returned false" when the file
+  // cannot be opened.
+  explicit XMPFiles(const std::string& filePath, XMP_FileFormat format = kXMP_UnknownFile,
+                    XMP_OptionBits openFlags = 0);
+  // Closes without writing pending changes when CloseFile was not called.
+  ~XMPFiles();
+  XMPFiles(const XMPFiles&) = delete;
+  XMPFiles& operator=(const XMPFiles&) = delete;
+
+  // False when the file does not exist, no handler takes it, or it cannot
+  // be opened as asked (kXMPFiles_OpenForUpdate on a read-only file).
+  // format kXMP_UnknownFile lets the toolkit detect the format.
+  bool OpenFile(const std::string& filePath, XMP_FileFormat format = kXMP_UnknownFile,
+                XMP_OptionBits openFlags = 0);
+  // Writes the packet given to PutXMP (when opened for update) and closes.
+  // kXMPFiles_UpdateSafely writes through a temporary file. Closing a
+  // closed object does nothing.
+  void CloseFile(XMP_OptionBits closeFlags = 0);
+  // False when no file is open. Any out pointer may be null.
+  bool GetFileInfo(std::string* filePath = nullptr, XMP_OptionBits* openFlags = nullptr,
+                   XMP_FileFormat* format = nullptr, XMP_OptionBits* handlerFlags = nullptr) const;
+  // Reads the file's XMP into xmpObj (replacing its content) and/or the raw
+  // packet text; false when the file has none.
+  bool GetXMP(XMPMeta* xmpObj = nullptr, std::string* rawPacket = nullptr);
+  // Whether PutXMP can store this packet (kXMPErr_BadObject when closed).
+  bool CanPutXMP(const XMPMeta& xmpObj);
+  // Stages the packet for writing at CloseFile (transient data excluded).
+  void PutXMP(const XMPMeta& xmpObj);
+
+  // ---- Process-wide ----
   // Counted start of the file part (it also holds a start of the core). The
   // plug-in folder is recorded; no plug-ins are loaded. Throws XMP_Error on
   // failure.
@@ -17,6 +54,29 @@ class XMPFiles {
   static void Terminate();
   // The folder given to the first Initialize, empty when none.
   static std::string GetPluginFolder();
+  // E.g. "Exempi 2.6.3, XMP Files with Exempi + XMP Core 6.0.0".
+  static std::string GetVersionInfo();
+  // The format a handler sees in the file; kXMP_UnknownFile when none (also
+  // for a missing file). ".xmp" files answer kXMP_XMLFile.
+  static XMP_FileFormat CheckFileFormat(const std::string& filePath);
+  // The handler flags of a format; false when no handler takes it.
+  static bool GetFormatInfo(XMP_FileFormat format, XMP_OptionBits* handlerFlags);
+  // The files that make up the document: the file itself, then its sidecar
+  // ("stem.xmp" beside it) when one exists. False (list untouched) when the
+  // file does not exist. Appends to resourceList.
+  static bool GetAssociatedResources(const std::string& filePath, std::vector<std::string>* resourceList,
+                                     XMP_FileFormat format = kXMP_UnknownFile, XMP_OptionBits options = 0);
+
+ private:
+  void* mFile = nullptr;  // the toolkit's file object, null for sidecars
+  bool mOpen = false;
+  bool mSidecar = false;
+  std::string mPath;
+  XMP_OptionBits mOpenFlags = 0;
+  XMP_FileFormat mFormat = kXMP_UnknownFile;
+  XMP_OptionBits mHandlerFlags = 0;
+  std::string mPending;  // sidecar packet to write at close
+  bool mHasPending = false;
 };
 
 }  // namespace ovraxmp

@@ -1,6 +1,7 @@
 // ovraxmp: the XMP packet holder and the process-wide toolkit functions.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 
@@ -33,6 +34,129 @@ class XMPMeta {
 
   // The handle, without adding a reference; null when there is no packet.
   XMPMetaRef GetInternalRef() const { return mRef; }
+
+  // ---- Whole packet ----
+  // Parses the whole buffer into this packet, replacing its content (and
+  // its multi-value marks). Without kXMP_RequireXMPMeta a bare rdf:RDF
+  // element is accepted too. Throws kXMPErr_BadXML / kXMPErr_BadRDF /
+  // kXMPErr_BadXMP for malformed input; an empty buffer gives an empty packet.
+  void ParseFromBuffer(const char* buffer, std::size_t length, XMP_OptionBits options = 0);
+  void ParseFromBuffer(const std::string& buffer, XMP_OptionBits options = 0);
+  // Serialises into *out (replaced). Empty newline/indent and zero padding
+  // mean the toolkit defaults ("\n", three blanks, 2048 bytes of padding).
+  // The transient namespace is never written.
+  void SerializeToBuffer(std::string* out, XMP_OptionBits options = 0, std::uint32_t padding = 0,
+                         const std::string& newline = std::string(),
+                         const std::string& indent = std::string(),
+                         std::int32_t baseIndent = 0) const;
+  // A new packet with a deep copy of the properties and the multi-value marks.
+  XMPMeta Clone(XMP_OptionBits options = 0) const;
+  // Removes every property and mark; the handle stays the same packet.
+  void Erase();
+
+  // ---- Properties (propName is a toolkit path relative to schemaNS) ----
+  // False when absent (value and options untouched); also false for an
+  // unregistered namespace. Composite nodes answer true with an empty value.
+  bool GetProperty(const std::string& schemaNS, const std::string& propName, std::string* propValue,
+                   XMP_OptionBits* options = nullptr) const;
+  // Creates or replaces the property; options with a composite bit create an
+  // empty struct or array. Throws kXMPErr_BadSchema for an unregistered
+  // namespace.
+  void SetProperty(const std::string& schemaNS, const std::string& propName,
+                   const std::string& propValue, XMP_OptionBits options = 0);
+  // Deleting an absent property does nothing.
+  void DeleteProperty(const std::string& schemaNS, const std::string& propName);
+  bool DoesPropertyExist(const std::string& schemaNS, const std::string& propName) const;
+
+  // Typed forms. Getters answer false when absent and throw kXMPErr_BadValue
+  // when the text does not convert; setters store the XMPUtils text form.
+  bool GetProperty_Bool(const std::string& schemaNS, const std::string& propName, bool* propValue,
+                        XMP_OptionBits* options = nullptr) const;
+  bool GetProperty_Int(const std::string& schemaNS, const std::string& propName,
+                       std::int32_t* propValue, XMP_OptionBits* options = nullptr) const;
+  bool GetProperty_Int64(const std::string& schemaNS, const std::string& propName,
+                         std::int64_t* propValue, XMP_OptionBits* options = nullptr) const;
+  bool GetProperty_Float(const std::string& schemaNS, const std::string& propName,
+                         double* propValue, XMP_OptionBits* options = nullptr) const;
+  bool GetProperty_Date(const std::string& schemaNS, const std::string& propName,
+                        XMP_DateTime* propValue, XMP_OptionBits* options = nullptr) const;
+  void SetProperty_Bool(const std::string& schemaNS, const std::string& propName, bool propValue,
+                        XMP_OptionBits options = 0);
+  void SetProperty_Int(const std::string& schemaNS, const std::string& propName,
+                       std::int32_t propValue, XMP_OptionBits options = 0);
+  void SetProperty_Int64(const std::string& schemaNS, const std::string& propName,
+                         std::int64_t propValue, XMP_OptionBits options = 0);
+  void SetProperty_Float(const std::string& schemaNS, const std::string& propName,
+                         double propValue, XMP_OptionBits options = 0);
+  void SetProperty_Date(const std::string& schemaNS, const std::string& propName,
+                        const XMP_DateTime& propValue, XMP_OptionBits options = 0);
+
+  // ---- Arrays (1-based indices; kXMP_ArrayLastItem = -1 is the last item) ----
+  // Absent array or item: false. A property that is not an array raises
+  // kXMPErr_BadXPath; an index of 0 or below -1 raises kXMPErr_BadIndex.
+  bool GetArrayItem(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex,
+                    std::string* itemValue, XMP_OptionBits* options = nullptr) const;
+  // Replaces the item, or inserts a new one before or after it with
+  // kXMP_InsertBeforeItem / kXMP_InsertAfterItem; index count+1 appends.
+  void SetArrayItem(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex,
+                    const std::string& itemValue, XMP_OptionBits options = 0);
+  // Appends an item, creating the array with arrayOptions when absent.
+  void AppendArrayItem(const std::string& schemaNS, const std::string& arrayName,
+                       XMP_OptionBits arrayOptions, const std::string& itemValue,
+                       XMP_OptionBits options = 0);
+  void DeleteArrayItem(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex);
+  bool DoesArrayItemExist(const std::string& schemaNS, const std::string& arrayName,
+                          XMP_Index itemIndex) const;
+  // 0 for an absent array; kXMPErr_BadXPath when the property is not one.
+  XMP_Index CountArrayItems(const std::string& schemaNS, const std::string& arrayName) const;
+
+  // ---- Struct fields and qualifiers ----
+  // The field / qualifier namespace must be registered (kXMPErr_BadSchema).
+  bool GetStructField(const std::string& schemaNS, const std::string& structName,
+                      const std::string& fieldNS, const std::string& fieldName,
+                      std::string* fieldValue, XMP_OptionBits* options = nullptr) const;
+  void SetStructField(const std::string& schemaNS, const std::string& structName,
+                      const std::string& fieldNS, const std::string& fieldName,
+                      const std::string& fieldValue, XMP_OptionBits options = 0);
+  void DeleteStructField(const std::string& schemaNS, const std::string& structName,
+                         const std::string& fieldNS, const std::string& fieldName);
+  bool DoesStructFieldExist(const std::string& schemaNS, const std::string& structName,
+                            const std::string& fieldNS, const std::string& fieldName) const;
+  bool GetQualifier(const std::string& schemaNS, const std::string& propName,
+                    const std::string& qualNS, const std::string& qualName,
+                    std::string* qualValue, XMP_OptionBits* options = nullptr) const;
+  // The property must exist (kXMPErr_BadXPath otherwise).
+  void SetQualifier(const std::string& schemaNS, const std::string& propName,
+                    const std::string& qualNS, const std::string& qualName,
+                    const std::string& qualValue, XMP_OptionBits options = 0);
+  void DeleteQualifier(const std::string& schemaNS, const std::string& propName,
+                       const std::string& qualNS, const std::string& qualName);
+  bool DoesQualifierExist(const std::string& schemaNS, const std::string& propName,
+                          const std::string& qualNS, const std::string& qualName) const;
+
+  // ---- Localised text (language alternatives) ----
+  // Chooses by the XMP rules: the specific language, else the first item of
+  // the generic language, else "x-default", else the first item. False when
+  // the property is absent or empty; kXMPErr_BadXPath when it is not alt-text.
+  bool GetLocalizedText(const std::string& schemaNS, const std::string& altTextName,
+                        const std::string& genericLang, const std::string& specificLang,
+                        std::string* actualLang, std::string* itemValue,
+                        XMP_OptionBits* options = nullptr) const;
+  // Sets the item of specificLang (creating the alt-text array) and keeps
+  // "x-default" in step as the XMP rules say.
+  void SetLocalizedText(const std::string& schemaNS, const std::string& altTextName,
+                        const std::string& genericLang, const std::string& specificLang,
+                        const std::string& itemValue, XMP_OptionBits options = 0);
+  void DeleteLocalizedText(const std::string& schemaNS, const std::string& altTextName,
+                           const std::string& genericLang, const std::string& specificLang);
+
+  // ---- Multi-value marks (in memory only) ----
+  // True when the path or one of its ancestors is marked.
+  bool IsMultiValued(const std::string& schemaNS, const std::string& propPath) const;
+  void SetMultiValued(const std::string& schemaNS, const std::string& propPath);
+  // Removes the marks of the path and of its descendants; an empty path
+  // clears the whole namespace.
+  void ClearMultiValueInfo(const std::string& schemaNS, const std::string& propPath);
 
   // ---- Process-wide start and stop (counted; thread-safe) ----
   // Starts the toolkit on the first call; throws XMP_Error when it fails.

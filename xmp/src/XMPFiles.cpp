@@ -1,0 +1,236 @@
+// Media files through the toolkit's handlers; .xmp sidecars by the layer.
+#include <ovraxmp/XMPFiles.h>
+
+#include <unistd.h>
+
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+
+#include <ovracore/FileSupport.h>
+#include <ovracore/Strings.h>
+#include <ovraxmp/XMPUtils.h>
+
+#include "XMPPacket.h"
+
+namespace ovraxmp {
+namespace {
+
+namespace fs = std::filesystem;
+
+XmpFilePtr F(void* file) { return static_cast<XmpFilePtr>(file); }
+
+fs::path PathOf(const std::string& utf8) { return fs::u8path(utf8); }
+
+bool IsRegularFile(const std::string& utf8) {
+  std::error_code ec;
+  return !utf8.empty() && fs::is_regular_file(PathOf(utf8), ec);
+}
+
+bool IsSidecarPath(const std::string& utf8) {
+  std::string ext = PathOf(utf8).extension().u8string();
+  for (char& c : ext)
+    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+  return ext == ".xmp";
+}
+
+constexpr XMP_OptionBits kSidecarHandlerFlags = kXMPFiles_CanInjectXMP | kXMPFiles_CanExpand |
+                                                kXMPFiles_CanRewrite | kXMPFiles_AllowsOnlyXMP |
+                                                kXMPFiles_ReturnsRawPacket | kXMPFiles_AllowsSafeUpdate;
+
+// The packet without its transient data, as a file must receive it.
+XMPMeta WithoutTransient(const XMPMeta& xmpObj) {
+  if (!xmpObj.DoesPropertyExist(kXMP_NS_Transient, "MultiFileCount") &&
+      !xmpObj.DoesPropertyExist(kXMP_NS_Transient, "DeletedProperties")) {
+    bool any = false;
+    if (detail::NamespaceKnown(kXMP_NS_Transient)) {
+      XmpIteratorPtr it = xmp_iterator_new(detail::Require(xmpObj.GetInternalRef()).Xmp(), kXMP_NS_Transient,
+                                           nullptr, XMP_ITER_JUSTCHILDREN);
+      any = it && xmp_iterator_next(it, nullptr, nullptr, nullptr, nullptr);
+      if (it) xmp_iterator_free(it);
+    }
+    if (!any) return xmpObj;
+  }
+  XMPMeta copy = xmpObj.Clone();
+  XMPUtils::RemoveProperties(&copy, kXMP_NS_Transient, std::string(), kXMPUtil_DoAllProperties);
+  return copy;
+}
+
+}  // namespace
+
+XMPFiles::XMPFiles(const std::string& filePath, XMP_FileFormat format, XMP_OptionBits openFlags) {
+  if (!OpenFile(filePath, format, openFlags)) throw XMP_Error(kXMPErr_BadFileFormat, "OpenFile returned false");
+}
+
+XMPFiles::~XMPFiles() {
+  if (mFile) xmp_files_free(F(mFile));
+}
+
+bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_OptionBits openFlags) {
+  if (mOpen) detail::Throw(kXMPErr_BadObject, "a file is already open");
+  detail::EnsureStarted();
+  if (!IsRegularFile(filePath)) return false;
+  const bool forUpdate = (openFlags & kXMPFiles_OpenForUpdate) != 0;
+  if (IsSidecarPath(filePath)) {
+    if (access(PathOf(filePath).c_str(), forUpdate ? (R_OK | W_OK) : R_OK) != 0) return false;
+    mSidecar = true;
+    mFormat = kXMP_XMLFile;
+    mHandlerFlags = kSidecarHandlerFlags;
+  } else {
+    if (format != kXMP_UnknownFile && format != XMPFiles::CheckFileFormat(filePath)) return false;
+    XmpFilePtr file = xmp_files_new();
+    if (!file) detail::ThrowLastError(kXMPErr_NoMemory, "creating a file object");
+    if (!xmp_files_open(file, filePath.c_str(), static_cast<XmpOpenFileOptions>(openFlags))) {
+      xmp_files_free(file);
+      return false;
+    }
+    XmpOpenFileOptions options{};
+    XmpFileType type = XMP_FT_UNKNOWN;
+    XmpFileFormatOptions handler{};
+    if (!xmp_files_get_file_info(file, nullptr, &options, &type, &handler)) {
+      xmp_files_free(file);
+      return false;
+    }
+    mFile = file;
+    mSidecar = false;
+    mFormat = type;
+    mHandlerFlags = handler;
+  }
+  mOpen = true;
+  mPath = filePath;
+  mOpenFlags = openFlags;
+  mHasPending = false;
+  mPending.clear();
+  return true;
+}
+
+void XMPFiles::CloseFile(XMP_OptionBits closeFlags) {
+  if (!mOpen) return;
+  mOpen = false;
+  if (mSidecar) {
+    const bool write = mHasPending;
+    mHasPending = false;
+    if (write && !ovracore::filesupport::SafeSave(ovracore::ToUTF16(mPath), mPending))
+      detail::Throw(kXMPErr_ExternalFailure, "writing \"" + mPath + "\"");
+    mPending.clear();
+    return;
+  }
+  XmpFilePtr file = F(mFile);
+  mFile = nullptr;
+  const bool ok = xmp_files_close(file, static_cast<XmpCloseFileOptions>(closeFlags));
+  const int id = ok ? 0 : xmp_get_error();
+  xmp_files_free(file);
+  if (!ok) detail::Throw(id != 0 ? id : kXMPErr_ExternalFailure, "closing \"" + mPath + "\"");
+}
+
+bool XMPFiles::GetFileInfo(std::string* filePath, XMP_OptionBits* openFlags, XMP_FileFormat* format,
+                           XMP_OptionBits* handlerFlags) const {
+  if (!mOpen) return false;
+  if (filePath) *filePath = mPath;
+  if (openFlags) *openFlags = mOpenFlags;
+  if (format) *format = mFormat;
+  if (handlerFlags) *handlerFlags = mHandlerFlags;
+  return true;
+}
+
+bool XMPFiles::GetXMP(XMPMeta* xmpObj, std::string* rawPacket) {
+  if (!mOpen) detail::Throw(kXMPErr_BadObject, "no file open");
+  if (mSidecar) {
+    std::ifstream in(PathOf(mPath), std::ios::binary);
+    std::ostringstream content;
+    content << in.rdbuf();
+    const std::string text = content.str();
+    if (text.find_first_not_of(" \t\r\n") == std::string::npos) return false;
+    if (xmpObj) xmpObj->ParseFromBuffer(text);
+    if (rawPacket) *rawPacket = text;
+    return true;
+  }
+  XmpFilePtr file = F(mFile);
+  if (rawPacket) {
+    detail::XmpString raw;
+    if (!xmp_files_get_xmp_xmpstring(file, raw, nullptr)) {
+      if (xmp_get_error() != 0) detail::ThrowLastError(kXMPErr_BadFileFormat, "reading XMP");
+      return false;
+    }
+    *rawPacket = raw.str();
+  }
+  if (xmpObj) {
+    XMPPacket& packet = detail::Require(xmpObj->GetInternalRef());
+    XmpPtr fresh = xmp_new_empty();
+    if (!fresh) detail::ThrowLastError(kXMPErr_NoMemory, "creating an XMP packet");
+    if (!xmp_files_get_xmp(file, fresh)) {
+      const int id = xmp_get_error();
+      xmp_free(fresh);
+      if (id != 0) detail::Throw(id, "reading XMP");
+      return false;
+    }
+    packet.ReplaceXmp(fresh);
+    packet.Marks().clear();
+  }
+  if (!xmpObj && !rawPacket) {
+    detail::XmpString raw;
+    return xmp_files_get_xmp_xmpstring(file, raw, nullptr);
+  }
+  return true;
+}
+
+bool XMPFiles::CanPutXMP(const XMPMeta& xmpObj) {
+  if (!mOpen) detail::Throw(kXMPErr_BadObject, "no file open");
+  detail::Require(xmpObj.GetInternalRef());
+  if (!(mOpenFlags & kXMPFiles_OpenForUpdate)) return false;
+  if (mSidecar) return true;
+  const XMPMeta clean = WithoutTransient(xmpObj);
+  return xmp_files_can_put_xmp(F(mFile), clean.GetInternalRef()->Xmp());
+}
+
+void XMPFiles::PutXMP(const XMPMeta& xmpObj) {
+  if (!mOpen) detail::Throw(kXMPErr_BadObject, "no file open");
+  detail::Require(xmpObj.GetInternalRef());
+  if (!(mOpenFlags & kXMPFiles_OpenForUpdate)) detail::Throw(kXMPErr_BadObject, "file not opened for update");
+  if (mSidecar) {
+    xmpObj.SerializeToBuffer(&mPending, kXMP_OmitPacketWrapper);
+    mHasPending = true;
+    return;
+  }
+  const XMPMeta clean = WithoutTransient(xmpObj);
+  if (!xmp_files_put_xmp(F(mFile), clean.GetInternalRef()->Xmp()))
+    detail::ThrowLastError(kXMPErr_BadFileFormat, "writing XMP into \"" + mPath + "\"");
+}
+
+std::string XMPFiles::GetVersionInfo() {
+  return std::string("Exempi ") + OVRAXMP_EXEMPI_VERSION + ", XMP Files with " + XMPMeta::GetVersionInfo();
+}
+
+XMP_FileFormat XMPFiles::CheckFileFormat(const std::string& filePath) {
+  if (!IsRegularFile(filePath)) return kXMP_UnknownFile;
+  if (IsSidecarPath(filePath)) return kXMP_XMLFile;
+  detail::EnsureStarted();
+  return xmp_files_check_file_format(filePath.c_str());
+}
+
+bool XMPFiles::GetFormatInfo(XMP_FileFormat format, XMP_OptionBits* handlerFlags) {
+  if (format == kXMP_XMLFile) {
+    if (handlerFlags) *handlerFlags = kSidecarHandlerFlags;
+    return true;
+  }
+  if (format == kXMP_UnknownFile) return false;
+  detail::EnsureStarted();
+  XmpFileFormatOptions options{};
+  if (!xmp_files_get_format_info(static_cast<XmpFileType>(format), &options)) return false;
+  if (handlerFlags) *handlerFlags = options;
+  return true;
+}
+
+bool XMPFiles::GetAssociatedResources(const std::string& filePath, std::vector<std::string>* resourceList,
+                                      XMP_FileFormat, XMP_OptionBits) {
+  if (!resourceList) detail::Throw(kXMPErr_BadParam, "no resource list");
+  if (!IsRegularFile(filePath)) return false;
+  resourceList->push_back(filePath);
+  if (IsSidecarPath(filePath)) return true;
+  const fs::path sidecar = PathOf(filePath).replace_extension(".xmp");
+  std::error_code ec;
+  if (fs::is_regular_file(sidecar, ec)) resourceList->push_back(sidecar.u8string());
+  return true;
+}
+
+}  // namespace ovraxmp

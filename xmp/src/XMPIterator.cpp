@@ -1,0 +1,65 @@
+#include <ovraxmp/XMPIterator.h>
+
+#include "XMPPacket.h"
+
+namespace ovraxmp {
+
+XMPIterator::XMPIterator(const XMPMeta& xmpObj, XMP_OptionBits options) : mMeta(xmpObj) {
+  Open(std::string(), std::string(), options);
+}
+
+XMPIterator::XMPIterator(const XMPMeta& xmpObj, const std::string& schemaNS, XMP_OptionBits options)
+    : mMeta(xmpObj) {
+  Open(schemaNS, std::string(), options);
+}
+
+XMPIterator::XMPIterator(const XMPMeta& xmpObj, const std::string& schemaNS, const std::string& propName,
+                         XMP_OptionBits options)
+    : mMeta(xmpObj) {
+  Open(schemaNS, propName, options);
+}
+
+void XMPIterator::Open(const std::string& schemaNS, const std::string& propName, XMP_OptionBits options) {
+  XmpPtr xmp = detail::Require(mMeta.GetInternalRef()).Xmp();
+  if (!propName.empty() && schemaNS.empty()) detail::Throw(kXMPErr_BadSchema, "a property needs its namespace");
+  if (!schemaNS.empty() && !detail::NamespaceKnown(schemaNS)) return;
+  if (!propName.empty() && !mMeta.DoesPropertyExist(schemaNS, propName)) return;
+  const XMP_OptionBits allowed = kXMP_IterJustChildren | kXMP_IterJustLeafNodes | kXMP_IterJustLeafName |
+                                 kXMP_IterOmitQualifiers;
+  if (options & ~allowed) detail::Throw(kXMPErr_BadOptions, "iteration options");
+  XmpIteratorPtr iter = xmp_iterator_new(xmp, schemaNS.empty() ? nullptr : schemaNS.c_str(),
+                                         propName.empty() ? nullptr : propName.c_str(),
+                                         static_cast<XmpIterOptions>(options));
+  if (!iter) detail::ThrowLastError(kXMPErr_InternalFailure, "starting an iteration");
+  mIter = iter;
+}
+
+XMPIterator::~XMPIterator() {
+  if (mIter) xmp_iterator_free(static_cast<XmpIteratorPtr>(mIter));
+}
+
+bool XMPIterator::Next(std::string* schemaNS, std::string* propPath, std::string* propValue,
+                       XMP_OptionBits* options) {
+  if (!mIter) return false;
+  detail::XmpString ns, path, value;
+  std::uint32_t bits = 0;
+  if (!xmp_iterator_next(static_cast<XmpIteratorPtr>(mIter), ns, path, value, &bits)) {
+    if (xmp_get_error() != 0) detail::ThrowLastError(kXMPErr_InternalFailure, "iterating");
+    return false;
+  }
+  if (schemaNS) *schemaNS = ns.str();
+  if (propPath) *propPath = path.str();
+  if (propValue) *propValue = value.str();
+  if (options) *options = bits;
+  return true;
+}
+
+void XMPIterator::Skip(XMP_OptionBits options) {
+  if (!mIter) return;
+  if (options != kXMP_IterSkipSubtree && options != kXMP_IterSkipSiblings)
+    detail::Throw(kXMPErr_BadOptions, "skip options");
+  if (!xmp_iterator_skip(static_cast<XmpIteratorPtr>(mIter), static_cast<XmpIterSkipOptions>(options)))
+    detail::ThrowLastError(kXMPErr_BadIterPosition, "skipping");
+}
+
+}  // namespace ovraxmp

@@ -1,0 +1,470 @@
+// Packet content: parse, serialise, and the property, array, field,
+// qualifier and localised-text operations. Every call tests registration
+// and node kind first, because the toolkit reports its failures on stderr.
+#include <string>
+
+#include <ovraxmp/XMPMeta.h>
+#include <ovraxmp/XMPUtils.h>
+
+#include "XMPPacket.h"
+
+namespace ovraxmp {
+namespace {
+
+using detail::XmpString;
+
+XmpPtr X(XMPMetaRef ref) { return detail::Require(ref).Xmp(); }
+
+[[noreturn]] void Fail(const std::string& what, const std::string& ns, const std::string& path) {
+  detail::ThrowLastError(kXMPErr_InternalFailure, what + " \"" + path + "\" in \"" + ns + "\"");
+}
+
+// Options of an existing node; false when absent or its namespace unknown.
+bool NodeOptions(XmpPtr xmp, const std::string& ns, const std::string& path, XMP_OptionBits* options) {
+  if (!detail::NamespaceKnown(ns)) return false;
+  std::uint32_t bits = 0;
+  if (!xmp_get_property(xmp, ns.c_str(), path.c_str(), nullptr, &bits)) {
+    if (xmp_get_error() != 0) Fail("reading", ns, path);
+    return false;
+  }
+  *options = bits;
+  return true;
+}
+
+void RequireArray(XmpPtr xmp, const std::string& ns, const std::string& arrayName, bool* exists,
+                  XMP_OptionBits* form = nullptr) {
+  XMP_OptionBits options = 0;
+  *exists = NodeOptions(xmp, ns, arrayName, &options);
+  if (*exists && !(options & kXMP_PropValueIsArray))
+    detail::Throw(kXMPErr_BadXPath, "\"" + arrayName + "\" is not an array");
+  if (form) *form = options;
+}
+
+void CheckIndex(XMP_Index index) {
+  if (index == 0 || index < kXMP_ArrayLastItem) detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(index));
+}
+
+// A bare rdf:RDF (no x:xmpmeta around it) gets the wrapper the toolkit wants.
+std::string WrapBareRDF(const char* buffer, std::size_t length) {
+  const std::string text(buffer, length);
+  std::size_t open = 0;
+  while ((open = text.find('<', open)) != std::string::npos &&
+         open + 1 < text.size() && (text[open + 1] == '?' || text[open + 1] == '!')) {
+    ++open;
+  }
+  if (open == std::string::npos) return text;
+  std::size_t close = text.rfind("<?xpacket");
+  if (close == std::string::npos || close < open) close = text.size();
+  return text.substr(0, open) + "<x:xmpmeta xmlns:x=\"adobe:ns:meta/\">" + text.substr(open, close - open) +
+         "</x:xmpmeta>" + text.substr(close);
+}
+
+}  // namespace
+
+// ---- whole packet ----
+
+void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_OptionBits options) {
+  XMPPacket& packet = detail::Require(mRef);
+  XmpPtr fresh = xmp_new_empty();
+  if (!fresh) detail::ThrowLastError(kXMPErr_NoMemory, "creating an XMP packet");
+  bool ok = true;
+  if (buffer && length > 0) {
+    const std::string_view view(buffer, length);
+    if (!(options & kXMP_RequireXMPMeta) && view.find("xmpmeta") == std::string_view::npos &&
+        view.find("rdf:RDF") != std::string_view::npos) {
+      const std::string wrapped = WrapBareRDF(buffer, length);
+      ok = xmp_parse(fresh, wrapped.data(), wrapped.size());
+    } else {
+      ok = xmp_parse(fresh, buffer, length);
+    }
+  }
+  if (!ok) {
+    const int id = xmp_get_error();
+    xmp_free(fresh);
+    detail::Throw(id != 0 ? id : kXMPErr_BadParse, "parsing XMP");
+  }
+  packet.ReplaceXmp(fresh);
+  packet.Marks().clear();
+}
+
+void XMPMeta::ParseFromBuffer(const std::string& buffer, XMP_OptionBits options) {
+  ParseFromBuffer(buffer.data(), buffer.size(), options);
+}
+
+void XMPMeta::SerializeToBuffer(std::string* out, XMP_OptionBits options, std::uint32_t padding,
+                                const std::string& newline, const std::string& indent,
+                                std::int32_t baseIndent) const {
+  XmpPtr xmp = X(mRef);
+  XmpPtr toWrite = xmp;
+  // Transient data stays in memory: write a copy without it.
+  if (detail::NamespaceKnown(kXMP_NS_Transient)) {
+    XmpIteratorPtr it = xmp_iterator_new(xmp, kXMP_NS_Transient, nullptr, XMP_ITER_JUSTCHILDREN);
+    const bool hasTransient = it && xmp_iterator_next(it, nullptr, nullptr, nullptr, nullptr);
+    if (it) xmp_iterator_free(it);
+    if (hasTransient) {
+      toWrite = xmp_copy(xmp);
+      if (!toWrite) detail::ThrowLastError(kXMPErr_NoMemory, "copying an XMP packet");
+      XMPMeta copy(detail::NewPacket(toWrite));
+      XMPMetaRefRelease(copy.GetInternalRef());  // the holder keeps the only reference
+      XMPUtils::RemoveProperties(&copy, kXMP_NS_Transient, std::string(), kXMPUtil_DoAllProperties);
+      copy.SerializeToBuffer(out, options, padding, newline, indent, baseIndent);
+      return;
+    }
+  }
+  XmpString text;
+  const bool ok = (newline.empty() && indent.empty() && baseIndent == 0)
+                      ? xmp_serialize(toWrite, text, options, padding)
+                      : xmp_serialize_and_format(toWrite, text, options, padding, newline.c_str(),
+                                                 indent.c_str(), baseIndent);
+  if (!ok) detail::ThrowLastError(kXMPErr_BadSerialize, "serialising XMP");
+  *out = text.str();
+}
+
+XMPMeta XMPMeta::Clone(XMP_OptionBits) const {
+  XMPPacket& packet = detail::Require(mRef);
+  XmpPtr copy = xmp_copy(packet.Xmp());
+  if (!copy) detail::ThrowLastError(kXMPErr_NoMemory, "copying an XMP packet");
+  XMPPacket* clone = detail::NewPacket(copy);
+  clone->Marks() = packet.Marks();
+  XMPMeta result(clone);
+  XMPMetaRefRelease(clone);
+  return result;
+}
+
+void XMPMeta::Erase() {
+  XMPPacket& packet = detail::Require(mRef);
+  XmpPtr fresh = xmp_new_empty();
+  if (!fresh) detail::ThrowLastError(kXMPErr_NoMemory, "creating an XMP packet");
+  packet.ReplaceXmp(fresh);
+  packet.Marks().clear();
+}
+
+// ---- simple properties ----
+
+bool XMPMeta::GetProperty(const std::string& ns, const std::string& name, std::string* value,
+                          XMP_OptionBits* options) const {
+  XmpPtr xmp = X(mRef);
+  if (!detail::NamespaceKnown(ns)) return false;
+  XmpString text;
+  std::uint32_t bits = 0;
+  if (!xmp_get_property(xmp, ns.c_str(), name.c_str(), text, &bits)) {
+    if (xmp_get_error() != 0) Fail("reading", ns, name);
+    return false;
+  }
+  if (value) *value = text.str();
+  if (options) *options = bits;
+  return true;
+}
+
+void XMPMeta::SetProperty(const std::string& ns, const std::string& name, const std::string& value,
+                          XMP_OptionBits options) {
+  XmpPtr xmp = X(mRef);
+  detail::RequirePrefix(ns);
+  if (!xmp_set_property(xmp, ns.c_str(), name.c_str(), value.c_str(), options)) Fail("writing", ns, name);
+}
+
+void XMPMeta::DeleteProperty(const std::string& ns, const std::string& name) {
+  XmpPtr xmp = X(mRef);
+  if (!detail::NamespaceKnown(ns)) return;
+  if (!xmp_delete_property(xmp, ns.c_str(), name.c_str())) Fail("deleting", ns, name);
+}
+
+bool XMPMeta::DoesPropertyExist(const std::string& ns, const std::string& name) const {
+  XmpPtr xmp = X(mRef);
+  if (!detail::NamespaceKnown(ns)) return false;
+  if (xmp_has_property(xmp, ns.c_str(), name.c_str())) return true;
+  if (xmp_get_error() != 0) Fail("testing", ns, name);
+  return false;
+}
+
+// ---- typed ----
+
+bool XMPMeta::GetProperty_Bool(const std::string& ns, const std::string& name, bool* value,
+                               XMP_OptionBits* options) const {
+  std::string text;
+  if (!GetProperty(ns, name, &text, options)) return false;
+  const bool converted = XMPUtils::ConvertToBool(text);
+  if (value) *value = converted;
+  return true;
+}
+
+bool XMPMeta::GetProperty_Int(const std::string& ns, const std::string& name, std::int32_t* value,
+                              XMP_OptionBits* options) const {
+  std::string text;
+  if (!GetProperty(ns, name, &text, options)) return false;
+  const std::int32_t converted = XMPUtils::ConvertToInt(text);
+  if (value) *value = converted;
+  return true;
+}
+
+bool XMPMeta::GetProperty_Int64(const std::string& ns, const std::string& name, std::int64_t* value,
+                                XMP_OptionBits* options) const {
+  std::string text;
+  if (!GetProperty(ns, name, &text, options)) return false;
+  const std::int64_t converted = XMPUtils::ConvertToInt64(text);
+  if (value) *value = converted;
+  return true;
+}
+
+bool XMPMeta::GetProperty_Float(const std::string& ns, const std::string& name, double* value,
+                                XMP_OptionBits* options) const {
+  std::string text;
+  if (!GetProperty(ns, name, &text, options)) return false;
+  const double converted = XMPUtils::ConvertToFloat(text);
+  if (value) *value = converted;
+  return true;
+}
+
+bool XMPMeta::GetProperty_Date(const std::string& ns, const std::string& name, XMP_DateTime* value,
+                               XMP_OptionBits* options) const {
+  std::string text;
+  if (!GetProperty(ns, name, &text, options)) return false;
+  XMP_DateTime converted;
+  XMPUtils::ConvertToDate(text, &converted);
+  if (value) *value = converted;
+  return true;
+}
+
+void XMPMeta::SetProperty_Bool(const std::string& ns, const std::string& name, bool value,
+                               XMP_OptionBits options) {
+  std::string text;
+  XMPUtils::ConvertFromBool(value, &text);
+  SetProperty(ns, name, text, options);
+}
+
+void XMPMeta::SetProperty_Int(const std::string& ns, const std::string& name, std::int32_t value,
+                              XMP_OptionBits options) {
+  std::string text;
+  XMPUtils::ConvertFromInt(value, &text);
+  SetProperty(ns, name, text, options);
+}
+
+void XMPMeta::SetProperty_Int64(const std::string& ns, const std::string& name, std::int64_t value,
+                                XMP_OptionBits options) {
+  std::string text;
+  XMPUtils::ConvertFromInt64(value, &text);
+  SetProperty(ns, name, text, options);
+}
+
+void XMPMeta::SetProperty_Float(const std::string& ns, const std::string& name, double value,
+                                XMP_OptionBits options) {
+  std::string text;
+  XMPUtils::ConvertFromFloat(value, std::string(), &text);
+  SetProperty(ns, name, text, options);
+}
+
+void XMPMeta::SetProperty_Date(const std::string& ns, const std::string& name, const XMP_DateTime& value,
+                               XMP_OptionBits options) {
+  std::string text;
+  XMPUtils::ConvertFromDate(value, &text);
+  SetProperty(ns, name, text, options);
+}
+
+// ---- arrays ----
+
+bool XMPMeta::GetArrayItem(const std::string& ns, const std::string& arrayName, XMP_Index index,
+                           std::string* value, XMP_OptionBits* options) const {
+  XmpPtr xmp = X(mRef);
+  CheckIndex(index);
+  bool exists = false;
+  RequireArray(xmp, ns, arrayName, &exists);
+  if (!exists) return false;
+  XmpString text;
+  std::uint32_t bits = 0;
+  if (!xmp_get_array_item(xmp, ns.c_str(), arrayName.c_str(), index, text, &bits)) {
+    if (xmp_get_error() != 0) Fail("reading an item of", ns, arrayName);
+    return false;
+  }
+  if (value) *value = text.str();
+  if (options) *options = bits;
+  return true;
+}
+
+void XMPMeta::SetArrayItem(const std::string& ns, const std::string& arrayName, XMP_Index index,
+                           const std::string& value, XMP_OptionBits options) {
+  XmpPtr xmp = X(mRef);
+  detail::RequirePrefix(ns);
+  CheckIndex(index);
+  bool exists = false;
+  RequireArray(xmp, ns, arrayName, &exists);
+  if (!exists) detail::Throw(kXMPErr_BadXPath, "array \"" + arrayName + "\" does not exist");
+  const XMP_Index count = CountArrayItems(ns, arrayName);
+  const XMP_Index position = index == kXMP_ArrayLastItem ? count : index;
+  if (position < 1 || position > count + 1 || (position == count + 1 && (options & kXMP_InsertAfterItem)))
+    detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(index));
+  if (!xmp_set_array_item(xmp, ns.c_str(), arrayName.c_str(), position, value.c_str(), options))
+    Fail("writing an item of", ns, arrayName);
+}
+
+void XMPMeta::AppendArrayItem(const std::string& ns, const std::string& arrayName, XMP_OptionBits arrayOptions,
+                              const std::string& value, XMP_OptionBits options) {
+  XmpPtr xmp = X(mRef);
+  detail::RequirePrefix(ns);
+  bool exists = false;
+  RequireArray(xmp, ns, arrayName, &exists);
+  if (!exists && !(arrayOptions & kXMP_PropArrayFormMask))
+    detail::Throw(kXMPErr_BadOptions, "appending to \"" + arrayName + "\" needs an array form");
+  if (!xmp_append_array_item(xmp, ns.c_str(), arrayName.c_str(), exists ? 0 : arrayOptions, value.c_str(),
+                             options))
+    Fail("appending to", ns, arrayName);
+}
+
+void XMPMeta::DeleteArrayItem(const std::string& ns, const std::string& arrayName, XMP_Index index) {
+  std::string path;
+  XMPUtils::ComposeArrayItemPath(ns, arrayName, index, &path);
+  bool exists = false;
+  RequireArray(X(mRef), ns, arrayName, &exists);
+  if (exists) DeleteProperty(ns, path);
+}
+
+bool XMPMeta::DoesArrayItemExist(const std::string& ns, const std::string& arrayName, XMP_Index index) const {
+  std::string path;
+  XMPUtils::ComposeArrayItemPath(ns, arrayName, index, &path);
+  bool exists = false;
+  RequireArray(X(mRef), ns, arrayName, &exists);
+  return exists && DoesPropertyExist(ns, path);
+}
+
+XMP_Index XMPMeta::CountArrayItems(const std::string& ns, const std::string& arrayName) const {
+  XmpPtr xmp = X(mRef);
+  bool exists = false;
+  RequireArray(xmp, ns, arrayName, &exists);
+  if (!exists) return 0;
+  // Probe the item paths: doubling, then bisection.
+  const std::string base = arrayName + "[";
+  const auto has = [&](XMP_Index i) {
+    const std::string path = base + std::to_string(i) + "]";
+    return xmp_has_property(xmp, ns.c_str(), path.c_str());
+  };
+  if (!has(1)) return 0;
+  XMP_Index low = 1, high = 2;
+  while (has(high)) {
+    low = high;
+    high *= 2;
+  }
+  while (high - low > 1) {
+    const XMP_Index mid = low + (high - low) / 2;
+    (has(mid) ? low : high) = mid;
+  }
+  return low;
+}
+
+// ---- struct fields and qualifiers ----
+
+bool XMPMeta::GetStructField(const std::string& ns, const std::string& structName, const std::string& fieldNS,
+                             const std::string& fieldName, std::string* value, XMP_OptionBits* options) const {
+  std::string path;
+  XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName, &path);
+  XMP_OptionBits parent = 0;
+  if (!NodeOptions(X(mRef), ns, structName, &parent)) return false;
+  if (!(parent & kXMP_PropValueIsStruct)) detail::Throw(kXMPErr_BadXPath, "\"" + structName + "\" is not a structure");
+  return GetProperty(ns, path, value, options);
+}
+
+void XMPMeta::SetStructField(const std::string& ns, const std::string& structName, const std::string& fieldNS,
+                             const std::string& fieldName, const std::string& value, XMP_OptionBits options) {
+  std::string path;
+  XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName, &path);
+  XMP_OptionBits parent = 0;
+  if (NodeOptions(X(mRef), ns, structName, &parent) && !(parent & kXMP_PropValueIsStruct))
+    detail::Throw(kXMPErr_BadXPath, "\"" + structName + "\" is not a structure");
+  SetProperty(ns, path, value, options);
+}
+
+void XMPMeta::DeleteStructField(const std::string& ns, const std::string& structName, const std::string& fieldNS,
+                                const std::string& fieldName) {
+  std::string path;
+  XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName, &path);
+  XMP_OptionBits parent = 0;
+  if (NodeOptions(X(mRef), ns, structName, &parent) && (parent & kXMP_PropValueIsStruct)) DeleteProperty(ns, path);
+}
+
+bool XMPMeta::DoesStructFieldExist(const std::string& ns, const std::string& structName,
+                                   const std::string& fieldNS, const std::string& fieldName) const {
+  std::string path;
+  XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName, &path);
+  XMP_OptionBits parent = 0;
+  return NodeOptions(X(mRef), ns, structName, &parent) && (parent & kXMP_PropValueIsStruct) &&
+         DoesPropertyExist(ns, path);
+}
+
+bool XMPMeta::GetQualifier(const std::string& ns, const std::string& propName, const std::string& qualNS,
+                           const std::string& qualName, std::string* value, XMP_OptionBits* options) const {
+  std::string path;
+  XMPUtils::ComposeQualifierPath(ns, propName, qualNS, qualName, &path);
+  return GetProperty(ns, path, value, options);
+}
+
+void XMPMeta::SetQualifier(const std::string& ns, const std::string& propName, const std::string& qualNS,
+                           const std::string& qualName, const std::string& value, XMP_OptionBits options) {
+  std::string path;
+  XMPUtils::ComposeQualifierPath(ns, propName, qualNS, qualName, &path);
+  if (!DoesPropertyExist(ns, propName))
+    detail::Throw(kXMPErr_BadXPath, "qualified property \"" + propName + "\" does not exist");
+  SetProperty(ns, path, value, options);
+}
+
+void XMPMeta::DeleteQualifier(const std::string& ns, const std::string& propName, const std::string& qualNS,
+                              const std::string& qualName) {
+  std::string path;
+  XMPUtils::ComposeQualifierPath(ns, propName, qualNS, qualName, &path);
+  DeleteProperty(ns, path);
+}
+
+bool XMPMeta::DoesQualifierExist(const std::string& ns, const std::string& propName, const std::string& qualNS,
+                                 const std::string& qualName) const {
+  std::string path;
+  XMPUtils::ComposeQualifierPath(ns, propName, qualNS, qualName, &path);
+  return DoesPropertyExist(ns, path);
+}
+
+// ---- localised text ----
+
+bool XMPMeta::GetLocalizedText(const std::string& ns, const std::string& altTextName,
+                               const std::string& genericLang, const std::string& specificLang,
+                               std::string* actualLang, std::string* itemValue, XMP_OptionBits* options) const {
+  XmpPtr xmp = X(mRef);
+  if (specificLang.empty()) detail::Throw(kXMPErr_BadParam, "empty specific language");
+  XMP_OptionBits form = 0;
+  if (!NodeOptions(xmp, ns, altTextName, &form)) return false;
+  if (!(form & kXMP_PropArrayIsAlternate) && !(form & kXMP_PropArrayIsAltText))
+    detail::Throw(kXMPErr_BadXPath, "\"" + altTextName + "\" is not a language alternative");
+  XmpString lang, text;
+  std::uint32_t bits = 0;
+  if (!xmp_get_localized_text(xmp, ns.c_str(), altTextName.c_str(), genericLang.c_str(), specificLang.c_str(),
+                              lang, text, &bits)) {
+    if (xmp_get_error() != 0) Fail("reading localised", ns, altTextName);
+    return false;
+  }
+  if (actualLang) *actualLang = lang.str();
+  if (itemValue) *itemValue = text.str();
+  if (options) *options = bits;
+  return true;
+}
+
+void XMPMeta::SetLocalizedText(const std::string& ns, const std::string& altTextName,
+                               const std::string& genericLang, const std::string& specificLang,
+                               const std::string& itemValue, XMP_OptionBits options) {
+  XmpPtr xmp = X(mRef);
+  detail::RequirePrefix(ns);
+  if (specificLang.empty()) detail::Throw(kXMPErr_BadParam, "empty specific language");
+  XMP_OptionBits form = 0;
+  if (NodeOptions(xmp, ns, altTextName, &form) && !(form & kXMP_PropArrayIsAlternate))
+    detail::Throw(kXMPErr_BadXPath, "\"" + altTextName + "\" is not a language alternative");
+  if (!xmp_set_localized_text(xmp, ns.c_str(), altTextName.c_str(), genericLang.c_str(), specificLang.c_str(),
+                              itemValue.c_str(), options))
+    Fail("writing localised", ns, altTextName);
+}
+
+void XMPMeta::DeleteLocalizedText(const std::string& ns, const std::string& altTextName,
+                                  const std::string& genericLang, const std::string& specificLang) {
+  XmpPtr xmp = X(mRef);
+  XMP_OptionBits form = 0;
+  if (!NodeOptions(xmp, ns, altTextName, &form) || !(form & kXMP_PropArrayIsAlternate)) return;
+  std::string lang;
+  if (!GetLocalizedText(ns, altTextName, genericLang, specificLang, &lang, nullptr, nullptr)) return;
+  if (!xmp_delete_localized_text(xmp, ns.c_str(), altTextName.c_str(), genericLang.c_str(), specificLang.c_str()))
+    Fail("deleting localised", ns, altTextName);
+}
+
+}  // namespace ovraxmp

@@ -1,0 +1,159 @@
+// Several files seen as one: collecting packets into an aggregate that marks
+// differing values, and distributing an edited aggregate back.
+#include <map>
+#include <string>
+#include <utility>
+
+#include <ovraxmp/XMPUtils.h>
+
+#include "XMPNodeTree.h"
+#include "XMPPacket.h"
+
+namespace ovraxmp {
+namespace {
+
+const char kMultiFileCount[] = "MultiFileCount";
+const char kDeletedProperties[] = "DeletedProperties";
+
+using Key = std::pair<std::string, std::string>;  // namespace, normalised name
+
+std::map<Key, std::string> PropertiesByKey(const XMPMeta& meta) {
+  std::map<Key, std::string> result;
+  for (const detail::TopLevel& p : detail::TopLevelProperties(meta)) {
+    if (p.ns == kXMP_NS_Transient) continue;
+    result.emplace(Key(p.ns, detail::NormalizedPath(p.ns, p.name)), p.name);
+  }
+  return result;
+}
+
+const detail::Node* FindChild(const detail::Node& node, const detail::Node& like) {
+  for (const detail::Node& child : node.children)
+    if (child.ns == like.ns && child.name == like.name) return &child;
+  return nullptr;
+}
+
+bool IsStruct(const detail::Node& node) { return (node.options & kXMP_PropValueIsStruct) != 0; }
+
+// Marks the differences below two nodes at the same path of the aggregate.
+void Compare(XMPMeta& target, const std::string& ns, const std::string& path, const detail::Node& have,
+             const detail::Node& incoming) {
+  if (target.IsMultiValued(ns, path)) return;
+  if (IsStruct(have) && IsStruct(incoming)) {
+    for (const detail::Node& field : have.children) {
+      const std::string fieldPath = path + "/" + field.name;
+      const detail::Node* other = FindChild(incoming, field);
+      if (!other)
+        target.SetMultiValued(ns, fieldPath);
+      else
+        Compare(target, ns, fieldPath, field, *other);
+    }
+    for (const detail::Node& field : incoming.children) {
+      if (!FindChild(have, field)) target.SetMultiValued(ns, path + "/" + field.name);
+    }
+    return;
+  }
+  if (detail::Canonical(have) != detail::Canonical(incoming)) target.SetMultiValued(ns, path);
+}
+
+bool HasMarkBelow(const XMPPacket& packet, const std::string& ns, const std::string& path) {
+  const auto found = packet.Marks().find(ns);
+  if (found == packet.Marks().end()) return false;
+  const std::string normal = detail::NormalizedPath(ns, path) + "/";
+  const auto it = found->second.lower_bound(normal);
+  return it != found->second.end() && it->compare(0, normal.size(), normal) == 0;
+}
+
+void DistributeNode(const XMPMeta& aggregate, const XMPPacket& packet, XMPMeta& member, const std::string& ns,
+                    const std::string& path, const detail::Node& node) {
+  if (aggregate.IsMultiValued(ns, path)) return;
+  if (!IsStruct(node) || !HasMarkBelow(packet, ns, path)) {
+    detail::WriteNode(member, ns, path, node);
+    return;
+  }
+  XMP_OptionBits options = 0;
+  if (!member.GetProperty(ns, path, nullptr, &options) || !(options & kXMP_PropValueIsStruct)) {
+    member.DeleteProperty(ns, path);
+    member.SetProperty(ns, path, std::string(), kXMP_PropValueIsStruct);
+  }
+  for (const detail::Node& field : node.children)
+    DistributeNode(aggregate, packet, member, ns, path + "/" + field.name, field);
+}
+
+}  // namespace
+
+void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_OptionBits) {
+  if (!targetPtr) detail::Throw(kXMPErr_BadParam, "no XMP object");
+  XMPMeta& target = *targetPtr;
+  detail::Require(target.GetInternalRef());
+  detail::Require(source.GetInternalRef());
+  std::string countText;
+  if (!target.GetProperty(kXMP_NS_Transient, kMultiFileCount, &countText)) {
+    for (const auto& entry : PropertiesByKey(source)) {
+      detail::Node node;
+      if (detail::ReadNode(source, entry.first.first, entry.second, &node))
+        detail::WriteNode(target, entry.first.first, entry.first.second, node);
+    }
+    target.SetProperty(kXMP_NS_Transient, kMultiFileCount, "1");
+    return;
+  }
+  std::int64_t count = 1;
+  try {
+    count = ConvertToInt64(countText);
+  } catch (const XMP_Error&) {
+    // A foreign value in our own counter: restart the count, keep collecting.
+  }
+  std::string next;
+  ConvertFromInt64(count + 1, &next);
+  target.SetProperty(kXMP_NS_Transient, kMultiFileCount, next);
+
+  const std::map<Key, std::string> have = PropertiesByKey(target);
+  const std::map<Key, std::string> incoming = PropertiesByKey(source);
+  for (const auto& entry : have) {
+    const std::string& ns = entry.first.first;
+    const std::string& name = entry.first.second;
+    if (target.IsMultiValued(ns, name)) continue;
+    const auto other = incoming.find(entry.first);
+    if (other == incoming.end()) {
+      target.SetMultiValued(ns, name);
+      continue;
+    }
+    detail::Node mine, theirs;
+    detail::ReadNode(target, ns, entry.second, &mine);
+    detail::ReadNode(source, ns, other->second, &theirs);
+    Compare(target, ns, name, mine, theirs);
+  }
+  for (const auto& entry : incoming) {
+    if (!have.count(entry.first)) target.SetMultiValued(entry.first.first, entry.first.second);
+  }
+}
+
+void XMPUtils::MultiFileDistribute(const XMPMeta& aggregate, XMPMeta* memberPtr, XMP_OptionBits) {
+  if (!memberPtr) detail::Throw(kXMPErr_BadParam, "no XMP object");
+  XMPMeta& member = *memberPtr;
+  detail::Require(member.GetInternalRef());
+  const XMPPacket& packet = detail::Require(aggregate.GetInternalRef());
+  for (const auto& entry : PropertiesByKey(aggregate)) {
+    detail::Node node;
+    if (detail::ReadNode(aggregate, entry.first.first, entry.second, &node))
+      DistributeNode(aggregate, packet, member, entry.first.first, entry.first.second, node);
+  }
+  // The deletion records: "prefix:path" of each deleted property.
+  const XMP_Index records = aggregate.CountArrayItems(kXMP_NS_Transient, kDeletedProperties);
+  for (XMP_Index i = 1; i <= records; ++i) {
+    std::string item, uri, path;
+    ComposeArrayItemPath(kXMP_NS_Transient, kDeletedProperties, i, &item);
+    XMP_OptionBits options = 0;
+    if (!aggregate.GetProperty(kXMP_NS_Transient, item, nullptr, &options) || !(options & kXMP_PropValueIsStruct))
+      continue;
+    if (!aggregate.GetStructField(kXMP_NS_Transient, item, kXMP_NS_Transient, "DelURI", &uri) ||
+        !aggregate.GetStructField(kXMP_NS_Transient, item, kXMP_NS_Transient, "DelPath", &path))
+      continue;
+    std::string prefix;
+    if (uri.empty() || path.empty() || !XMPMeta::GetNamespacePrefix(uri, &prefix)) continue;
+    // Only records whose path starts with the namespace's own prefix.
+    if (path.compare(0, prefix.size(), prefix) != 0) continue;
+    if (member.DoesPropertyExist(uri, path)) member.DeleteProperty(uri, path);
+  }
+}
+
+}  // namespace ovraxmp

@@ -1,0 +1,46 @@
+// Not part of the interface: subtrees of a packet read into memory, so that
+// the whole-packet utilities can compare, copy and merge them.
+#pragma once
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include <ovraxmp/XMPMeta.h>
+
+namespace ovraxmp {
+namespace detail {
+
+struct Node {
+  std::string ns;    // namespace of a field or qualifier (empty for items)
+  std::string name;  // "prefix:name" of a field or qualifier, "[i]" of an item
+  std::string value;
+  XMP_OptionBits options = 0;
+  std::vector<Node> children;    // fields or items, in document order
+  std::vector<Node> qualifiers;  // in document order
+};
+
+// Reads the node at (ns, path); false when absent.
+bool ReadNode(const XMPMeta& meta, const std::string& ns, const std::string& path, Node* node);
+// Writes node at (ns, path), replacing whatever is there.
+void WriteNode(XMPMeta& meta, const std::string& ns, const std::string& path, const Node& node);
+// A text equal for two nodes exactly when their values are equal: item
+// order counts except in unordered arrays, qualifiers count, struct fields
+// and qualifiers compare by name.
+std::string Canonical(const Node& node);
+// A simple node with an empty value, or a composite node without children.
+bool IsEmptyNode(const Node& node);
+
+// Every top-level property: namespace URI and the property's name with
+// prefix ("dc:title"), in document order.
+struct TopLevel {
+  std::string ns;
+  std::string name;
+};
+std::vector<TopLevel> TopLevelProperties(const XMPMeta& meta, const std::string& onlyNS = std::string());
+
+// The path of a child of the node at parentPath.
+std::string ChildPath(const std::string& parentPath, const Node& child);
+
+}  // namespace detail
+}  // namespace ovraxmp

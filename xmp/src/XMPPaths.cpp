@@ -1,0 +1,122 @@
+// Path composition and the in-memory multi-value marks.
+#include <string>
+
+#include <ovraxmp/XMPMeta.h>
+#include <ovraxmp/XMPUtils.h>
+
+#include "XMPPacket.h"
+
+namespace ovraxmp {
+namespace {
+
+void RequireName(const std::string& name, const char* what) {
+  if (name.empty()) detail::Throw(kXMPErr_BadXPath, std::string("empty ") + what);
+}
+
+// The path ends of every ancestor of path (positions of '/' and '[' outside
+// of brackets and quotes).
+template <typename Visit>
+void ForEachAncestor(const std::string& path, Visit visit) {
+  int depth = 0;
+  bool quoted = false;
+  for (std::size_t i = 0; i < path.size(); ++i) {
+    const char c = path[i];
+    if (quoted) {
+      if (c == '"') quoted = false;
+      continue;
+    }
+    if (c == '"') quoted = true;
+    else if (c == ']') --depth;
+    else if (depth == 0 && (c == '/' || c == '[')) {
+      if (i > 0 && visit(i)) return;
+      if (c == '[') ++depth;
+    } else if (c == '[') {
+      ++depth;
+    }
+  }
+}
+
+}  // namespace
+
+void XMPUtils::ComposeArrayItemPath(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex,
+                                    std::string* fullPath) {
+  detail::RequirePrefix(schemaNS);
+  RequireName(arrayName, "array name");
+  if (itemIndex == kXMP_ArrayLastItem) {
+    *fullPath = arrayName + "[last()]";
+    return;
+  }
+  if (itemIndex <= 0) detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(itemIndex));
+  *fullPath = arrayName + "[" + std::to_string(itemIndex) + "]";
+}
+
+void XMPUtils::ComposeStructFieldPath(const std::string& schemaNS, const std::string& structName,
+                                      const std::string& fieldNS, const std::string& fieldName,
+                                      std::string* fullPath) {
+  detail::RequirePrefix(schemaNS);
+  RequireName(structName, "structure name");
+  RequireName(fieldName, "field name");
+  const std::string prefix = detail::RequirePrefix(fieldNS);
+  *fullPath = structName + "/" + prefix + fieldName;
+}
+
+void XMPUtils::ComposeQualifierPath(const std::string& schemaNS, const std::string& propName,
+                                    const std::string& qualNS, const std::string& qualName, std::string* fullPath) {
+  detail::RequirePrefix(schemaNS);
+  RequireName(propName, "property name");
+  RequireName(qualName, "qualifier name");
+  const std::string prefix = detail::RequirePrefix(qualNS);
+  *fullPath = propName + "/?" + prefix + qualName;
+}
+
+void XMPUtils::ComposeLangSelector(const std::string& schemaNS, const std::string& arrayName,
+                                   const std::string& langName, std::string* fullPath) {
+  detail::RequirePrefix(schemaNS);
+  RequireName(arrayName, "array name");
+  RequireName(langName, "language");
+  std::string lang = langName;
+  for (char& c : lang)
+    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+  *fullPath = arrayName + "[?xml:lang=\"" + lang + "\"]";
+}
+
+bool XMPMeta::IsMultiValued(const std::string& ns, const std::string& path) const {
+  XMPPacket& packet = detail::Require(mRef);
+  if (packet.Marks().empty()) return false;
+  const auto found = packet.Marks().find(ns);
+  if (found == packet.Marks().end() || found->second.empty()) return false;
+  const std::set<std::string>& marks = found->second;
+  const std::string normal = detail::NormalizedPath(ns, path);
+  if (marks.count(normal)) return true;
+  bool hit = false;
+  ForEachAncestor(normal, [&](std::size_t end) {
+    hit = marks.count(normal.substr(0, end)) > 0;
+    return hit;
+  });
+  return hit;
+}
+
+void XMPMeta::SetMultiValued(const std::string& ns, const std::string& path) {
+  XMPPacket& packet = detail::Require(mRef);
+  if (ns.empty() || path.empty()) detail::Throw(kXMPErr_BadParam, "empty namespace or path");
+  packet.Marks()[ns].insert(detail::NormalizedPath(ns, path));
+}
+
+void XMPMeta::ClearMultiValueInfo(const std::string& ns, const std::string& path) {
+  XMPPacket& packet = detail::Require(mRef);
+  const auto found = packet.Marks().find(ns);
+  if (found == packet.Marks().end()) return;
+  if (path.empty()) {
+    packet.Marks().erase(found);
+    return;
+  }
+  std::set<std::string>& marks = found->second;
+  const std::string normal = detail::NormalizedPath(ns, path);
+  for (auto it = marks.lower_bound(normal); it != marks.end() && it->compare(0, normal.size(), normal) == 0;) {
+    const bool descendant = it->size() == normal.size() || (*it)[normal.size()] == '/' || (*it)[normal.size()] == '[';
+    it = descendant ? marks.erase(it) : std::next(it);
+  }
+  if (marks.empty()) packet.Marks().erase(found);
+}
+
+}  // namespace ovraxmp
