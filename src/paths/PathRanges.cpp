@@ -93,6 +93,7 @@ class LeafWalkIterator
     return mAtEnd == other.mAtEnd && (mAtEnd || mPosition == other.mPosition);
   }
   void increment() {
+    if (mAtEnd) return;
     ++mStack.back().index;
     ++mPosition;
     Settle();
