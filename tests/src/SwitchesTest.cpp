@@ -1,0 +1,64 @@
+#include <ovracore/Diagnostics.h>
+
+#include "SrcTestSupport.h"
+
+using namespace ovrametadata;
+
+namespace {
+
+TEST(XMPWritingSwitch, CallsBackOnlyOnChange) {
+  ASSERT_FALSE(IsXMPWritingDisabled());
+  int calls = 0;
+  auto callback = boost::make_shared<XMPWritingChangedCallback>([&] { ++calls; });
+  NotifyWhenXMPWritingChanged(callback);
+
+  DisableXMPWriting(false);
+  EXPECT_EQ(calls, 0);
+  DisableXMPWriting(true);
+  DisableXMPWriting(true);
+  EXPECT_EQ(calls, 1);
+  EXPECT_TRUE(IsXMPWritingDisabled());
+  DisableXMPWriting(false);
+  EXPECT_EQ(calls, 2);
+  EXPECT_FALSE(IsXMPWritingDisabled());
+  callback->clear();
+}
+
+TEST(XMPWritingSwitch, ClearedCallbackIsSkippedAndDropped) {
+  int firstCalls = 0;
+  int secondCalls = 0;
+  auto first = boost::make_shared<XMPWritingChangedCallback>([&] { ++firstCalls; });
+  auto second = boost::make_shared<XMPWritingChangedCallback>([&] { ++secondCalls; });
+  NotifyWhenXMPWritingChanged(first);
+  first->clear();
+  const long heldBefore = first.use_count();
+  NotifyWhenXMPWritingChanged(second);
+  EXPECT_EQ(first.use_count(), heldBefore - 1);
+
+  DisableXMPWriting(true);
+  DisableXMPWriting(false);
+  EXPECT_EQ(firstCalls, 0);
+  EXPECT_EQ(secondCalls, 2);
+  second->clear();
+}
+
+TEST(ForcedWritableSwitch, OnlyTheExactWordTrueSwitchesItOn) {
+  ovracore::ClearDebugValue("ForceMetadataWritable");
+  EXPECT_FALSE(IsAllMetadataForcedWritable());
+
+  ForcedAllMetadataWritable(true);
+  EXPECT_EQ(ovracore::GetDebugValue("ForceMetadataWritable"), "true");
+  EXPECT_TRUE(IsAllMetadataForcedWritable());
+  ForcedAllMetadataWritable(false);
+  EXPECT_EQ(ovracore::GetDebugValue("ForceMetadataWritable"), "false");
+  EXPECT_FALSE(IsAllMetadataForcedWritable());
+
+  // Set from outside the library, as a debug preference would.
+  ovracore::SetDebugValue("ForceMetadataWritable", "TRUE");
+  EXPECT_FALSE(IsAllMetadataForcedWritable());
+  ovracore::SetDebugValue("ForceMetadataWritable", "true");
+  EXPECT_TRUE(IsAllMetadataForcedWritable());
+  ovracore::ClearDebugValue("ForceMetadataWritable");
+}
+
+}  // namespace
