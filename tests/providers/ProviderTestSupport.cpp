@@ -1,0 +1,215 @@
+#include "ProviderTestSupport.h"
+
+#include <fcntl.h>
+#include <linux/capability.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <stdexcept>
+
+#include <gtest/gtest.h>
+
+#include <ovrametadata/Definitions.h>
+
+#include "MediaFiles.h"
+
+namespace ovratest {
+
+namespace fs = std::filesystem;
+using namespace ovrametadata;
+
+namespace {
+
+const char kTestDefinitions[] = R"(<?xml version="1.0" encoding="UTF-8"?>
+<xmp_definitions>
+  <xmp_type name="PTPoint" label="Point">
+    <xmp_field namespace="http://ns.example.org/provtest/1.0/" prefix="pt" name="X" type="text" label="X"/>
+    <xmp_field namespace="http://ns.example.org/provtest/1.0/" prefix="pt" name="Y" type="text" label="Y"/>
+  </xmp_type>
+  <xmp_type name="PTOuter" label="Outer">
+    <xmp_field namespace="http://ns.example.org/provtest/1.0/" prefix="pt" name="Inner" type="PTPoint" label="Inner"/>
+    <xmp_field namespace="http://ns.example.org/provtest/1.0/" prefix="pt" name="Tag" type="text" label="Tag"/>
+  </xmp_type>
+  <xmp_schema namespace="http://ns.example.org/provtest/1.0/" prefix="pt" label="Provider tests">
+    <xmp_property name="Title" type="text" label="Title"/>
+    <xmp_property name="Note" type="text" label="Note"/>
+    <xmp_property name="Count" type="integer" label="Count"/>
+    <xmp_property name="Ratio" type="real" label="Ratio"/>
+    <xmp_property name="Tags" type="bag" element_type="text" label="Tags"/>
+    <xmp_property name="Steps" type="seq" element_type="text" label="Steps"/>
+    <xmp_property name="ISteps" type="seq" element_type="text" category="internal" label="Internal steps"/>
+    <xmp_property name="Spot" type="PTPoint" label="Spot"/>
+    <xmp_property name="Outer" type="PTOuter" label="Outer"/>
+    <xmp_property name="Points" type="seq" element_type="PTPoint" label="Points"/>
+  </xmp_schema>
+  <xmp_schema namespace="http://ns.example.org/provtest2/1.0/" prefix="pu" label="Other tests">
+    <xmp_property name="Title" type="text" label="Title"/>
+    <xmp_property name="Owner" type="text" label="Owner"/>
+  </xmp_schema>
+</xmp_definitions>
+)";
+
+// Keeps the library started, with the test schemas registered, for the
+// whole program.
+class ProviderEnvironment : public ::testing::Environment {
+ public:
+  void SetUp() override {
+    Initialize();
+    ParseBufferAndRegisterDefinitions(kTestDefinitions, u"provider-tests", false);
+    if (!NamespaceDefinition(kTestNS) || !NamespaceDefinition(kOtherNS)) {
+      throw std::runtime_error("test schemas did not register");
+    }
+  }
+  void TearDown() override { Terminate(); }
+};
+
+::testing::Environment* const kEnvironment =
+    ::testing::AddGlobalTestEnvironment(new ProviderEnvironment);
+
+}  // namespace
+
+Path TestPath(const std::string& property) {
+  return PathForSchemaNameAndPropertyName(UTF8String(kTestNS), property);
+}
+
+Path OtherPath(const std::string& property) {
+  return PathForSchemaNameAndPropertyName(UTF8String(kOtherNS), property);
+}
+
+Path FieldPath(const Path& parent, const std::string& typeId, const std::string& field) {
+  return CreatePathFromStructureField(parent, FieldNameDefinition(TypeIdDefinition(typeId), field));
+}
+
+std::string PacketText(const std::string& properties) {
+  return std::string(
+             "<x:xmpmeta xmlns:x=\"adobe:ns:meta/\">"
+             "<rdf:RDF xmlns:rdf=\"http://www.w3.org/1999/02/22-rdf-syntax-ns#\">"
+             "<rdf:Description rdf:about=\"\""
+             " xmlns:pt=\"http://ns.example.org/provtest/1.0/\""
+             " xmlns:pu=\"http://ns.example.org/provtest2/1.0/\""
+             " xmlns:xmp=\"http://ns.adobe.com/xap/1.0/\""
+             " xmlns:dc=\"http://purl.org/dc/elements/1.1/\">") +
+         properties + "</rdf:Description></rdf:RDF></x:xmpmeta>";
+}
+
+ovraxmp::XMPMeta Packet(const std::string& properties) {
+  ovraxmp::XMPMeta meta;
+  meta.ParseFromBuffer(PacketText(properties));
+  return meta;
+}
+
+std::string Serialize(XMPMetaRef xmp) {
+  std::string out;
+  if (xmp) ovraxmp::XMPMeta(xmp).SerializeToBuffer(&out, ovraxmp::kXMP_OmitPacketWrapper);
+  return out;
+}
+
+std::string Text(XMPMetaRef xmp, const Path& path) {
+  UTF8String value;
+  GetValue(xmp, path, value);
+  return value;
+}
+
+GetValueResult ResultOf(XMPMetaRef xmp, const Path& path) {
+  UTF8String value;
+  GetValueResult result = ValueError;
+  GetValue(xmp, path, value, &result);
+  return result;
+}
+
+std::string Raw(XMPMetaRef xmp, const std::string& ns, const std::string& name) {
+  std::string value;
+  if (!xmp || !ovraxmp::XMPMeta(xmp).GetProperty(ns, name, &value)) return "<absent>";
+  return value;
+}
+
+// ---------------------------------------------------------------------------
+
+RecordingBufferProvider::RecordingBufferProvider(const std::string& packetText)
+    : BufferProviderImpl(reinterpret_cast<const unsigned char*>(packetText.data()),
+                         packetText.size()) {}
+
+boost::shared_ptr<RecordingBufferProvider> RecordingBufferProvider::FromProperties(
+    const std::string& properties) {
+  return boost::make_shared<RecordingBufferProvider>(PacketText(properties));
+}
+
+void RecordingBufferProvider::WriteBuffer(const std::vector<Path>& changes, const char* data,
+                                          std::size_t length) {
+  if (duringWrite) duringWrite();
+  if (throwOnWrite) throw std::runtime_error("the owner refuses the bytes");
+  writes.push_back(Write{changes, std::string(data, length)});
+}
+
+CallCounter::CallCounter()
+    : calls(std::make_shared<int>(0)), handles(std::make_shared<std::vector<XMPMetaRef>>()) {
+  auto count = calls;
+  auto seen = handles;
+  callback = std::make_shared<MetaDataChangedCallback>([count, seen](XMPMetaRef xmp) {
+    ++*count;
+    seen->push_back(xmp);
+  });
+}
+
+// ---------------------------------------------------------------------------
+
+std::string MediaExtension(MediaKind kind) {
+  switch (kind) {
+    case MediaKind::JPEG: return ".jpg";
+    case MediaKind::MP4: return ".mp4";
+    case MediaKind::WAV: return ".wav";
+  }
+  return "";
+}
+
+std::string MediaBytes(MediaKind kind) {
+  switch (kind) {
+    case MediaKind::JPEG: return media::MinimalJPEG();
+    case MediaKind::MP4: return media::MinimalMP4();
+    case MediaKind::WAV: return media::MinimalWAV();
+  }
+  return "";
+}
+
+void PutXMPIntoFile(const fs::path& file, const ovraxmp::XMPMeta& packet) {
+  ovraxmp::XMPFiles handler(file.string(), ovraxmp::kXMP_UnknownFile,
+                            ovraxmp::kXMPFiles_OpenForUpdate);
+  handler.PutXMP(packet);
+  handler.CloseFile(ovraxmp::kXMPFiles_NoOptions);
+}
+
+fs::path MakeMediaFile(const fs::path& folder, const std::string& stem, MediaKind kind,
+                       const std::string& properties) {
+  const fs::path file = folder / (stem + MediaExtension(kind));
+  WriteFile(file, MediaBytes(kind));
+  if (!properties.empty()) PutXMPIntoFile(file, Packet(properties));
+  return file;
+}
+
+std::u16string U16Path(const fs::path& path) { return ovracore::ToUTF16(path.string()); }
+
+boost::shared_ptr<FileProvider> OpenFile(const fs::path& path) {
+  return boost::make_shared<FileProvider>(U16Path(path));
+}
+
+int RunWithoutPermissionOverride(const std::function<int()>& fn) {
+  const pid_t child = ::fork();
+  if (child < 0) return 77;
+  if (child == 0) {
+    __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
+    __user_cap_data_struct data[2] = {};
+    if (::syscall(SYS_capget, &header, data) != 0) ::_exit(77);
+    for (int cap : {CAP_DAC_OVERRIDE, CAP_DAC_READ_SEARCH, CAP_FOWNER}) {
+      data[cap / 32].effective &= ~(1u << (cap % 32));
+      data[cap / 32].permitted &= ~(1u << (cap % 32));
+    }
+    if (::syscall(SYS_capset, &header, data) != 0) ::_exit(77);
+    ::_exit(fn());
+  }
+  int status = 0;
+  if (::waitpid(child, &status, 0) != child || !WIFEXITED(status)) return 78;
+  return WEXITSTATUS(status);
+}
+
+}  // namespace ovratest
