@@ -2,7 +2,10 @@
 // time zone.
 #include "format/FormatInternal.h"
 
+#include <map>
 #include <memory>
+#include <tuple>
+#include <utility>
 
 #include <unicode/datefmt.h>
 #include <unicode/gregocal.h>
@@ -36,19 +39,46 @@ bool IsValidDateTime(const XMP_DateTime& dt) {
 
 // The instant of a UTC date-time record, in ICU's milliseconds.
 bool ComposeUTCInstant(const XMP_DateTime& dt, UDate& instant) {
+  // Building a calendar costs far more than using one; each thread keeps its
+  // own because ICU calendars are not thread-safe.
+  thread_local std::unique_ptr<icu::GregorianCalendar> calendar;
   UErrorCode status = U_ZERO_ERROR;
-  icu::GregorianCalendar calendar(*icu::TimeZone::getGMT(), icu::Locale::getRoot(), status);
-  if (U_FAILURE(status)) return false;
-  calendar.clear();
+  if (!calendar) {
+    calendar = std::make_unique<icu::GregorianCalendar>(*icu::TimeZone::getGMT(),
+                                                         icu::Locale::getRoot(), status);
+    if (U_FAILURE(status)) {
+      calendar.reset();
+      return false;
+    }
+  }
+  calendar->clear();
   if (dt.hasDate) {
-    calendar.set(dt.year, dt.month - 1, dt.day, dt.hour, dt.minute, dt.second);
+    calendar->set(dt.year, dt.month - 1, dt.day, dt.hour, dt.minute, dt.second);
   } else {
     // A time alone still needs a day to be an instant. Day 0 of year 0 would
     // pick up the zone's historic local mean time, so a modern day is used.
-    calendar.set(1970, UCAL_JANUARY, 1, dt.hour, dt.minute, dt.second);
+    calendar->set(1970, UCAL_JANUARY, 1, dt.hour, dt.minute, dt.second);
   }
-  instant = calendar.getTime(status);
+  instant = calendar->getTime(status);
   return U_SUCCESS(status);
+}
+
+// A medium-style formatter for the language, kept per thread and style; the
+// caller sets its time zone before each use.
+icu::DateFormat* MediumFormatter(const UTF8String& language, bool withDate, bool withTime) {
+  using Key = std::tuple<UTF8String, bool, bool>;
+  thread_local std::map<Key, std::unique_ptr<icu::DateFormat>> formatters;
+  Key key(language, withDate, withTime);
+  const auto found = formatters.find(key);
+  if (found != formatters.end()) return found->second.get();
+
+  const icu::Locale locale(language.c_str());
+  if (locale.isBogus()) return nullptr;
+  std::unique_ptr<icu::DateFormat> formatter(icu::DateFormat::createDateTimeInstance(
+      withDate ? icu::DateFormat::kMedium : icu::DateFormat::kNone,
+      withTime ? icu::DateFormat::kMedium : icu::DateFormat::kNone, locale));
+  if (!formatter) return nullptr;
+  return formatters.emplace(std::move(key), std::move(formatter)).first->second.get();
 }
 
 }  // namespace
@@ -72,15 +102,15 @@ UTF8String FormatDate(const UTF8String& value) {
   UDate instant = 0;
   if (!ComposeUTCInstant(dt, instant)) return UTF8String();
 
-  const icu::Locale locale(ovracore::ApplicationLanguage().c_str());
-  if (locale.isBogus()) return UTF8String();
-  std::unique_ptr<icu::DateFormat> formatter(icu::DateFormat::createDateTimeInstance(
-      dt.hasDate ? icu::DateFormat::kMedium : icu::DateFormat::kNone,
-      dt.hasTime ? icu::DateFormat::kMedium : icu::DateFormat::kNone, locale));
+  icu::DateFormat* formatter =
+      MediumFormatter(ovracore::ApplicationLanguage(), dt.hasDate, dt.hasTime);
   if (!formatter) return UTF8String();
   // A date without a time names a calendar day, not an instant: shifting it
   // into the local zone would show the day before west of UTC.
-  if (!dt.hasTime) formatter->setTimeZone(*icu::TimeZone::getGMT());
+  if (dt.hasTime)
+    formatter->adoptTimeZone(icu::TimeZone::createDefault());
+  else
+    formatter->setTimeZone(*icu::TimeZone::getGMT());
 
   icu::UnicodeString text;
   formatter->format(instant, text);

@@ -4,6 +4,7 @@
 
 #include <cmath>
 #include <cstdint>
+#include <exception>
 #include <iterator>
 #include <utility>
 
@@ -167,10 +168,19 @@ bool FormatPhotographicSensitivity(XMPMetaRef xmp, const Path&, UTF8String& out,
   ReadInt(xmp, kNamespace_ExifEX, "PhotographicSensitivity", sensitivity, sensitivityResult);
   if (*sensitivityResult == ValueMixed) return false;
 
-  const Path ratings = PathForSchemaNameAndPropertyName(UTF8String(kNamespace_Exif),
-                                                        UTF8String("ISOSpeedRatings"));
+  Path firstRating;
+  try {
+    firstRating = CreatePathFromArrayItem(
+        PathForSchemaNameAndPropertyName(UTF8String(kNamespace_Exif), UTF8String("ISOSpeedRatings")),
+        1);
+  } catch (const std::exception&) {
+    // The item composition lets toolkit errors through; a constructed value
+    // must not throw into the text read.
+    if (result) *result = ValueError;
+    return false;
+  }
   UTF8String rating;
-  if (!GetValue(xmp, CreatePathFromArrayItem(ratings, 1), rating, result)) return false;
+  if (!GetValue(xmp, firstRating, rating, result)) return false;
 
   // 65535 means "too high for the 16-bit field": the kind of sensitivity
   // then says which figure the rating is.
