@@ -1,0 +1,208 @@
+// The file-format cache and the associated files of a media file.
+#include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <thread>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include <boost/date_time/posix_time/posix_time.hpp>
+
+#include <ovracore/Strings.h>
+#include <ovraxmp/XMPConsts.h>
+#include <ovrametadata/Initialize.h>
+#include <ovrametadata/MetadataUtils.h>
+
+#include "../providers/MediaFiles.h"
+#include "MetadataUtilsInternal.h"
+#include "TestSupport.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+namespace pt = boost::posix_time;
+using namespace ovrametadata;
+using namespace ovrametadata::utility;
+
+class LibraryEnvironment : public ::testing::Environment {
+ public:
+  void SetUp() override { Initialize(); }
+  void TearDown() override { Terminate(); }
+};
+::testing::Environment* const kEnvironment =
+    ::testing::AddGlobalTestEnvironment(new LibraryEnvironment);
+
+std::u16string U16(const fs::path& path) { return ovracore::ToUTF16(path.string()); }
+
+void Touch(const fs::path& file, int seconds) {
+  fs::last_write_time(file, fs::last_write_time(file) + std::chrono::seconds(seconds));
+}
+
+class FormatCache : public ::testing::Test {
+ protected:
+  fs::path Make(const std::string& name, const std::string& bytes) {
+    const fs::path file = dir / name;
+    ovratest::WriteFile(file, bytes);
+    return file;
+  }
+  ovratest::TempDir dir;
+};
+
+TEST_F(FormatCache, AMissingFileIsUnknownAndNotCached) {
+  const std::u16string missing = U16(dir / "missing.jpg");
+  const auto opens = detail::FormatDetectionOpenCount();
+  EXPECT_EQ(GetXMPFormat(missing), ovraxmp::kXMP_UnknownFile);
+  EXPECT_FALSE(detail::CachedXMPFormat(missing));
+  EXPECT_EQ(detail::FormatDetectionOpenCount(), opens);
+}
+
+TEST_F(FormatCache, DetectsEachFormatOnceWhileTheFileIsUnchanged) {
+  const std::vector<std::pair<fs::path, XMP_FileFormat>> files = {
+      {Make("a.jpg", ovratest::media::MinimalJPEG()), ovraxmp::kXMP_JPEGFile},
+      {Make("b.wav", ovratest::media::MinimalWAV()), ovraxmp::kXMP_WAVFile},
+      {Make("c.mp4", ovratest::media::MinimalMP4()), ovraxmp::kXMP_MPEG4File},
+  };
+  for (const auto& [file, format] : files) {
+    const auto opens = detail::FormatDetectionOpenCount();
+    EXPECT_EQ(GetXMPFormat(U16(file)), format) << file;
+    EXPECT_EQ(detail::FormatDetectionOpenCount(), opens + 1);
+    EXPECT_EQ(GetXMPFormat(U16(file)), format) << file;
+    EXPECT_EQ(GetXMPFormat(U16(file)), format) << file;
+    EXPECT_EQ(detail::FormatDetectionOpenCount(), opens + 1) << "opened again: " << file;
+    const auto entry = detail::CachedXMPFormat(U16(file));
+    ASSERT_TRUE(entry);
+    EXPECT_EQ(entry->format, format);
+    EXPECT_FALSE(entry->modified.is_special());
+  }
+}
+
+TEST_F(FormatCache, ATouchedFileIsDetectedAnewAndItsEntryReplaced) {
+  const fs::path file = Make("clip.jpg", ovratest::media::MinimalJPEG());
+  ASSERT_EQ(GetXMPFormat(U16(file)), ovraxmp::kXMP_JPEGFile);
+  const pt::ptime first = detail::CachedXMPFormat(U16(file))->modified;
+  // The same name now holds a WAV file with a later time.
+  ovratest::WriteFile(file, ovratest::media::MinimalWAV());
+  Touch(file, 5);
+  const auto opens = detail::FormatDetectionOpenCount();
+  EXPECT_EQ(GetXMPFormat(U16(file)), ovraxmp::kXMP_WAVFile);
+  EXPECT_EQ(detail::FormatDetectionOpenCount(), opens + 1);
+  const auto entry = detail::CachedXMPFormat(U16(file));
+  ASSERT_TRUE(entry);
+  EXPECT_EQ(entry->format, ovraxmp::kXMP_WAVFile);
+  EXPECT_EQ(entry->modified - first, pt::seconds(5));
+}
+
+TEST_F(FormatCache, AnUnreadableFileIsCachedAsUnknown) {
+  const fs::path file = Make("notes.jpg", "just some text, no image at all");
+  const auto opens = detail::FormatDetectionOpenCount();
+  EXPECT_EQ(GetXMPFormat(U16(file)), ovraxmp::kXMP_UnknownFile);
+  EXPECT_EQ(GetXMPFormat(U16(file)), ovraxmp::kXMP_UnknownFile);
+  EXPECT_EQ(detail::FormatDetectionOpenCount(), opens + 1);
+  ASSERT_TRUE(detail::CachedXMPFormat(U16(file)));
+}
+
+TEST_F(FormatCache, AddingNeverOverwritesAndNeedsAValidTime) {
+  const fs::path file = Make("added.jpg", ovratest::media::MinimalJPEG());
+  const pt::ptime when(boost::gregorian::date(2020, 1, 2), pt::hours(3));
+  AddCachedXMPFormat(U16(file), ovraxmp::kXMP_PNGFile, when);
+  AddCachedXMPFormat(U16(file), ovraxmp::kXMP_TIFFFile, when + pt::hours(1));
+  auto entry = detail::CachedXMPFormat(U16(file));
+  ASSERT_TRUE(entry);
+  EXPECT_EQ(entry->format, ovraxmp::kXMP_PNGFile);
+  EXPECT_EQ(entry->modified, when);
+  // The recorded time does not match the file: the next call detects anew.
+  EXPECT_EQ(GetXMPFormat(U16(file)), ovraxmp::kXMP_JPEGFile);
+
+  const std::u16string missing = U16(dir / "missing.jpg");
+  AddCachedXMPFormat(missing, ovraxmp::kXMP_JPEGFile, pt::ptime(pt::not_a_date_time));
+  EXPECT_FALSE(detail::CachedXMPFormat(missing));
+  AddCachedXMPFormat(missing, ovraxmp::kXMP_JPEGFile, pt::ptime(pt::pos_infin));
+  EXPECT_FALSE(detail::CachedXMPFormat(missing));
+
+  // Not-a-date-time for an existing file takes the file's own time, so the
+  // entry is then trusted without opening.
+  const fs::path other = Make("other.wav", ovratest::media::MinimalWAV());
+  AddCachedXMPFormat(U16(other), ovraxmp::kXMP_PNGFile, pt::ptime(pt::not_a_date_time));
+  const auto opens = detail::FormatDetectionOpenCount();
+  EXPECT_EQ(GetXMPFormat(U16(other)), ovraxmp::kXMP_PNGFile);
+  EXPECT_EQ(detail::FormatDetectionOpenCount(), opens);
+}
+
+TEST_F(FormatCache, ErasingForgetsThePath) {
+  const fs::path file = Make("erase.wav", ovratest::media::MinimalWAV());
+  GetXMPFormat(U16(file));
+  EraseCachedXMPFormat(U16(file));
+  EXPECT_FALSE(detail::CachedXMPFormat(U16(file)));
+  EraseCachedXMPFormat(U16(file));
+  const auto opens = detail::FormatDetectionOpenCount();
+  EXPECT_EQ(GetXMPFormat(U16(file)), ovraxmp::kXMP_WAVFile);
+  EXPECT_EQ(detail::FormatDetectionOpenCount(), opens + 1);
+}
+
+TEST_F(FormatCache, EightThreadsAtOnceAllGetTheRightFormat) {
+  std::vector<std::pair<std::u16string, XMP_FileFormat>> files;
+  for (int i = 0; i < 6; ++i) {
+    files.emplace_back(U16(Make("j" + std::to_string(i) + ".jpg", ovratest::media::MinimalJPEG())),
+                       ovraxmp::kXMP_JPEGFile);
+    files.emplace_back(U16(Make("w" + std::to_string(i) + ".wav", ovratest::media::MinimalWAV())),
+                       ovraxmp::kXMP_WAVFile);
+  }
+  const auto opens = detail::FormatDetectionOpenCount();
+  std::atomic<int> wrong{0};
+  std::vector<std::thread> threads;
+  for (int t = 0; t < 8; ++t) {
+    threads.emplace_back([&, t] {
+      for (int round = 0; round < 50; ++round) {
+        for (std::size_t i = 0; i < files.size(); ++i) {
+          const auto& [path, format] = files[(i + static_cast<std::size_t>(t)) % files.size()];
+          if (GetXMPFormat(path) != format) ++wrong;
+          // One thread keeps forgetting a path, so detection and lookups mix.
+          if (t == 0 && round % 10 == 0) EraseCachedXMPFormat(files[0].first);
+        }
+      }
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(wrong.load(), 0);
+  // Each file is opened at most once per thread, plus the forced re-detections.
+  EXPECT_LE(detail::FormatDetectionOpenCount() - opens, files.size() * 8 + 5 * 8);
+  for (const auto& [path, format] : files) {
+    const auto entry = detail::CachedXMPFormat(path);
+    ASSERT_TRUE(entry);
+    EXPECT_EQ(entry->format, format);
+  }
+}
+
+// ---------------------------------------------------------------------------
+
+TEST(AssociatedFiles, AMediaFileListsItselfThenItsSidecarAndAppends) {
+  ovratest::TempDir dir;
+  const fs::path file = dir / "shot.jpg";
+  ovratest::WriteFile(file, ovratest::media::MinimalJPEG());
+  std::vector<std::u16string> files = {u"kept"};
+  ASSERT_TRUE(GetAssociatedFiles(U16(file), files));
+  ASSERT_GE(files.size(), 2u);
+  EXPECT_EQ(files[0], u"kept");
+  EXPECT_EQ(fs::path(ovracore::ToUTF8(files[1])).filename(), "shot.jpg");
+
+  ovratest::WriteFile(dir / "shot.xmp", "<x:xmpmeta xmlns:x=\"adobe:ns:meta/\"/>");
+  std::vector<std::u16string> withSidecar;
+  ASSERT_TRUE(GetAssociatedFiles(U16(file), withSidecar));
+  const bool hasSidecar =
+      std::any_of(withSidecar.begin(), withSidecar.end(), [](const std::u16string& f) {
+        return fs::path(ovracore::ToUTF8(f)).filename() == "shot.xmp";
+      });
+  EXPECT_TRUE(hasSidecar);
+}
+
+TEST(AssociatedFiles, AFileTheToolkitCannotHandleGivesFalse) {
+  ovratest::TempDir dir;
+  std::vector<std::u16string> files;
+  bool result = true;
+  EXPECT_NO_THROW(result = GetAssociatedFiles(U16(dir / "nothing-here.mov"), files));
+  EXPECT_FALSE(result);
+  EXPECT_TRUE(files.empty());
+}
+
+}  // namespace
