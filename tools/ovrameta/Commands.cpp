@@ -1,0 +1,647 @@
+#include "Commands.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <iostream>
+#include <memory>
+#include <set>
+
+#include <boost/make_shared.hpp>
+#include <nlohmann/json.hpp>
+#include <unistd.h>
+
+#include <ovrametadata/Definitions.h>
+#include <ovrametadata/Initialize.h>
+#include <ovrametadata/MetadataUtils.h>
+#include <ovrametadata/Paths.h>
+#include <ovrametadata/Providers.h>
+#include <ovrametadata/ValueEditing.h>
+#include <ovrametadata/Values.h>
+
+#include "Names.h"
+#include "Progress.h"
+#include "Reading.h"
+#include "TextUtil.h"
+#include "Validation.h"
+
+namespace ovrameta {
+
+using namespace ovrametadata;
+using Json = nlohmann::ordered_json;
+
+namespace {
+
+constexpr XMP_FileFormat kUnknownFormat = 0x20202020;
+
+// ---------------------------------------------------------------------------
+// Messages and exit status
+
+// Problems the library reports while the tool works; printed with the name
+// of the file being worked on.
+std::vector<std::string>& LibraryMessages() {
+  static std::vector<std::string> messages;
+  return messages;
+}
+
+class Reporter {
+ public:
+  explicit Reporter(Progress* progress = nullptr) : mProgress(progress) {}
+
+  void SetProgress(Progress* progress) { mProgress = progress; }
+
+  // "ovrameta: <context>: <message>", and the status becomes at least status.
+  void Error(const std::string& context, const std::string& message, int status) {
+    if (mProgress) mProgress->Clear();
+    std::cerr << "ovrameta: " << (context.empty() ? "" : context + ": ") << message << std::endl;
+    mStatus = std::max(mStatus, status);
+  }
+
+  // Relays what the library reported since the last call.
+  void FlushLibrary(const std::string& context) {
+    auto& messages = LibraryMessages();
+    for (const auto& message : messages) {
+      if (mProgress) mProgress->Clear();
+      std::cerr << "ovrameta: " << (context.empty() ? "" : context + ": ") << "warning: "
+                << message << std::endl;
+    }
+    messages.clear();
+  }
+
+  int status() const { return mStatus; }
+
+ private:
+  Progress* mProgress;
+  int mStatus = kExitSuccess;
+};
+
+std::string Quoted(const std::string& text) { return "\"" + text + "\""; }
+
+// Several files named in one message: all of them when few, else the first
+// and a count.
+std::string FileList(const std::vector<std::string>& files) {
+  if (files.size() <= 3) {
+    std::string list;
+    for (const auto& file : files) list += (list.empty() ? "" : ", ") + file;
+    return list;
+  }
+  return files.front() + " and " + std::to_string(files.size() - 1) + " other files";
+}
+
+// ---------------------------------------------------------------------------
+// Files
+
+struct OpenedFile {
+  std::string name;
+  boost::shared_ptr<FileProvider> provider;
+};
+
+// Opens one media file. An unreadable file, or one the toolkit cannot
+// handle, is reported (status 2) and gives false. A readable file without
+// XMP gives a provider without metadata.
+bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out) {
+  std::error_code error;
+  if (!std::filesystem::exists(name, error)) {
+    reporter.Error(name, "cannot read file: No such file or directory", kExitUsage);
+    return false;
+  }
+  if (!std::filesystem::is_regular_file(name, error)) {
+    reporter.Error(name, "cannot read file: not a regular file", kExitUsage);
+    return false;
+  }
+  {
+    std::ifstream probe(name, std::ios::binary);
+    if (!probe) {
+      reporter.Error(name, std::string("cannot read file: ") + std::strerror(errno), kExitUsage);
+      return false;
+    }
+  }
+  const UTF16String path = ToUTF16(name);
+  auto provider = boost::make_shared<FileProvider>(path);
+  reporter.FlushLibrary(name);
+  if (!provider->MetaDataAccess() && utility::GetXMPFormat(path) == kUnknownFormat) {
+    reporter.Error(name, "cannot read file: not a media file with metadata support", kExitUsage);
+    return false;
+  }
+  out.name = name;
+  out.provider = provider;
+  return true;
+}
+
+// Arguments that name properties (or assignments) rather than files. A
+// path that exists is always a file.
+bool IsExistingPath(const std::string& argument) {
+  std::error_code error;
+  return std::filesystem::exists(argument, error);
+}
+
+// ---------------------------------------------------------------------------
+// Printing
+
+void PrintLines(std::ostream& out, const std::string& indent, const std::string& head,
+                const std::string& text) {
+  // Continuation lines of a multi-line value line up under its first line.
+  out << indent << head;
+  const std::string continuation = indent + std::string(head.size(), ' ');
+  std::string::size_type start = 0;
+  while (true) {
+    const auto end = text.find('\n', start);
+    out << text.substr(start, end - start) << '\n';
+    if (end == std::string::npos) break;
+    out << continuation;
+    start = end + 1;
+  }
+}
+
+void PrintNode(std::ostream& out, const ValueNode& node, int depth) {
+  const std::string indent(static_cast<std::size_t>(depth) * 2, ' ');
+  if (node.mixed) {
+    out << indent << node.label << ": (mixed)\n";
+    return;
+  }
+  switch (node.kind) {
+    case ValueNode::kSimple:
+      PrintLines(out, indent, node.label + ": ", node.value);
+      break;
+    case ValueNode::kStruct:
+      out << indent << node.label << ":\n";
+      for (const auto& child : node.children) PrintNode(out, child, depth + 1);
+      break;
+    case ValueNode::kArray:
+      if (node.children.empty()) {
+        PrintLines(out, indent, node.label + ": ", node.value);
+        break;
+      }
+      out << indent << node.label << ":\n";
+      for (const auto& item : node.children) {
+        if (item.kind == ValueNode::kSimple) {
+          PrintLines(out, indent + "  ", "- ", item.value);
+        } else {
+          out << indent << "  " << item.label << "\n";
+          for (const auto& child : item.children) PrintNode(out, child, depth + 2);
+        }
+      }
+      break;
+  }
+}
+
+void PrintSchemas(std::ostream& out, const std::vector<SchemaValues>& schemas) {
+  for (const auto& schema : schemas) {
+    out << schema.label << '\n';
+    for (const auto& value : schema.values) PrintNode(out, value, 1);
+  }
+}
+
+// "name = value" lines for every leaf below node (arrays of simple values
+// as one line, their items joined).
+void PrintFlat(std::ostream& out, const std::string& prefix, const ValueNode& node, bool raw) {
+  if (node.kind == ValueNode::kStruct ||
+      (node.kind == ValueNode::kArray && !node.children.empty() &&
+       node.children.front().kind != ValueNode::kSimple)) {
+    for (const auto& child : node.children) PrintFlat(out, prefix, child, raw);
+    return;
+  }
+  const std::string text = node.mixed ? "(mixed)" : raw && node.raw ? *node.raw : node.value;
+  out << prefix << node.name << " = " << text << '\n';
+}
+
+Json NodeJson(const ValueNode& node, bool withSchema) {
+  Json json;
+  json["name"] = node.name;
+  if (withSchema) json["schema"] = node.name.substr(0, node.name.find(':'));
+  json["label"] = node.label;
+  json["type"] = node.typeText;
+  if (!node.primitive.empty()) json["primitive"] = node.primitive;
+  if (node.mixed) {
+    json["mixed"] = true;
+    return json;
+  }
+  switch (node.kind) {
+    case ValueNode::kSimple:
+      json["value"] = node.value;
+      json["raw"] = node.raw ? Json(*node.raw) : Json(nullptr);
+      break;
+    case ValueNode::kStruct: {
+      Json fields = Json::array();
+      for (const auto& child : node.children) fields.push_back(NodeJson(child, false));
+      json["fields"] = fields;
+      break;
+    }
+    case ValueNode::kArray: {
+      if (!node.value.empty() || node.raw) {
+        json["value"] = node.value;
+        json["raw"] = node.raw ? Json(*node.raw) : Json(nullptr);
+      }
+      Json items = Json::array();
+      for (const auto& child : node.children) items.push_back(NodeJson(child, false));
+      json["items"] = items;
+      break;
+    }
+  }
+  return json;
+}
+
+// ---------------------------------------------------------------------------
+// Arguments
+
+struct Assignment {
+  ResolvedName name;
+  std::string value;
+};
+
+// Splits the positional arguments of get and set into files and names.
+void SplitArguments(const std::vector<std::string>& arguments, std::vector<std::string>& files,
+                    std::vector<std::string>& names) {
+  for (const auto& argument : arguments) {
+    const auto equals = argument.find('=');
+    const std::string head = equals == std::string::npos ? argument : argument.substr(0, equals);
+    if (LooksLikeName(head) && !IsExistingPath(argument)) {
+      names.push_back(argument);
+    } else {
+      files.push_back(argument);
+    }
+  }
+}
+
+}  // namespace
+
+// ---------------------------------------------------------------------------
+// Session
+
+Session::Session() {
+  try {
+    Initialize();
+  } catch (const std::exception& error) {
+    std::cerr << "ovrameta: cannot start the XMP toolkit: " << error.what() << std::endl;
+    return;
+  }
+  mOk = true;
+  // Start-up problems (a broken custom definitions file) come first.
+  for (const auto& info : GetErrorInfos()) {
+    const std::string source = ToUTF8(info.source);
+    std::cerr << "ovrameta: " << (source.empty() ? "" : source + ": ") << "warning: "
+              << ToUTF8(info.message) << std::endl;
+  }
+  // The library shares the callback; it lives until Terminate.
+  NotifyOnError(boost::make_shared<ErrorCallback>(
+      [](const UTF16String& message) { LibraryMessages().push_back(ToUTF8(message)); }));
+}
+
+Session::~Session() {
+  if (mOk) Terminate();
+}
+
+// ---------------------------------------------------------------------------
+// show
+
+int ShowCommand(const std::vector<std::string>& files, bool each) {
+  Reporter reporter;
+  ReadOptions options;
+  if (files.size() == 1 || each) {
+    bool first = true;
+    for (const auto& name : files) {
+      OpenedFile file;
+      if (!OpenFile(name, reporter, file)) continue;
+      MetaDataReadAccess reader(file.provider);
+      const auto schemas = ReadAllValues(*reader, options);
+      reporter.FlushLibrary(name);
+      if (files.size() > 1) {
+        std::cout << (first ? "" : "\n") << "== " << name << " ==\n";
+      }
+      first = false;
+      if (schemas.empty()) std::cout << "(no metadata)\n";
+      PrintSchemas(std::cout, schemas);
+    }
+    return reporter.status();
+  }
+
+  // Several files: one aggregate, with "(mixed)" where the files differ.
+  Progress progress(files.size(), "files read");
+  reporter.SetProgress(&progress);
+  auto aggregate = boost::make_shared<AggregateProvider>();
+  std::size_t opened = 0;
+  for (const auto& name : files) {
+    OpenedFile file;
+    if (OpenFile(name, reporter, file)) {
+      aggregate->AddProvider(file.provider, false);
+      ++opened;
+    }
+    progress.Step();
+  }
+  aggregate->OnProxyMetaDataChange(nullptr);
+  progress.Clear();
+  reporter.SetProgress(nullptr);
+  if (opened == 0) return reporter.status();
+  MetaDataReadAccess reader(aggregate);
+  const auto schemas = ReadAllValues(*reader, options);
+  reporter.FlushLibrary(std::to_string(opened) + " files");
+  if (schemas.empty()) std::cout << "(no metadata)\n";
+  PrintSchemas(std::cout, schemas);
+  return reporter.status();
+}
+
+// ---------------------------------------------------------------------------
+// get
+
+int GetCommand(const std::vector<std::string>& arguments, const GetOptions& options) {
+  Reporter reporter;
+  std::vector<std::string> files;
+  std::vector<std::string> nameTexts;
+  SplitArguments(arguments, files, nameTexts);
+  if (files.empty()) {
+    reporter.Error("", "get: no file given", kExitUsage);
+    return reporter.status();
+  }
+  if (nameTexts.empty() && !options.json) {
+    reporter.Error("", "get: no property name given (prefix:Property), or use --json", kExitUsage);
+    return reporter.status();
+  }
+  std::vector<ResolvedName> names;
+  for (const auto& text : nameTexts) {
+    ResolvedName name;
+    std::string error;
+    if (text.find('=') != std::string::npos) {
+      reporter.Error("", Quoted(text) + ": get takes names, not assignments", kExitUsage);
+    } else if (!ResolveName(text, name, error)) {
+      reporter.Error("", error, kExitUsage);
+    } else {
+      names.push_back(name);
+    }
+  }
+  if (reporter.status() != kExitSuccess) return reporter.status();
+
+  ReadOptions readOptions;
+  readOptions.raw = options.raw || options.json;
+  readOptions.items = options.json;
+  const bool bare = files.size() == 1 && names.size() == 1 && !options.json;
+  Json output = Json::array();
+  Progress progress(files.size(), "files read");
+  reporter.SetProgress(&progress);
+  for (const auto& fileName : files) {
+    OpenedFile file;
+    if (!OpenFile(fileName, reporter, file)) {
+      progress.Step();
+      continue;
+    }
+    MetaDataReadAccess reader(file.provider);
+    Json properties = Json::array();
+    if (names.empty()) {
+      for (const auto& schema : ReadAllValues(*reader, readOptions)) {
+        for (const auto& value : schema.values) properties.push_back(NodeJson(value, true));
+      }
+    }
+    for (const auto& name : names) {
+      ValueNode node;
+      const bool found = ReadValue(*reader, name.path, name.name, readOptions, node);
+      // A raw read of a value that is only constructed finds nothing stored.
+      const bool stored = found && (!options.raw || node.raw || node.kind != ValueNode::kSimple);
+      if (!stored) {
+        reporter.Error(fileName, name.name + ": no " + (found ? "stored " : "") + "value",
+                       kExitAbsent);
+        if (options.json) {
+          Json missing;
+          missing["name"] = name.name;
+          missing["label"] = name.label;
+          missing["type"] = TypeText(*name.entry);
+          missing["value"] = nullptr;
+          properties.push_back(missing);
+        }
+        continue;
+      }
+      progress.Clear();
+      if (options.json) {
+        properties.push_back(NodeJson(node, true));
+      } else if (bare && node.kind == ValueNode::kSimple) {
+        std::cout << (options.raw && node.raw ? *node.raw : node.value) << '\n';
+      } else if (bare && node.kind == ValueNode::kArray &&
+                 (node.children.empty() || node.children.front().kind == ValueNode::kSimple)) {
+        std::cout << (options.raw && node.raw ? *node.raw : node.value) << '\n';
+      } else {
+        PrintFlat(std::cout, files.size() > 1 ? fileName + ": " : std::string(), node,
+                  options.raw);
+      }
+    }
+    reporter.FlushLibrary(fileName);
+    if (options.json) {
+      Json entry;
+      entry["file"] = fileName;
+      entry["properties"] = properties;
+      output.push_back(entry);
+    }
+    progress.Step();
+  }
+  progress.Clear();
+  if (options.json) std::cout << output.dump(2) << '\n';
+  return reporter.status();
+}
+
+// ---------------------------------------------------------------------------
+// set
+
+int SetCommand(const std::vector<std::string>& arguments, const std::vector<std::string>& deletes) {
+  Reporter reporter;
+  std::vector<std::string> files;
+  std::vector<std::string> assignmentTexts;
+  SplitArguments(arguments, files, assignmentTexts);
+  if (files.empty()) {
+    reporter.Error("", "set: no file given", kExitUsage);
+    return reporter.status();
+  }
+  if (assignmentTexts.empty() && deletes.empty()) {
+    reporter.Error("", "set: nothing to do (give NAME=VALUE or --delete NAME)", kExitUsage);
+    return reporter.status();
+  }
+
+  // Everything is checked before anything is written.
+  std::vector<Assignment> assignments;
+  for (const auto& text : assignmentTexts) {
+    const auto equals = text.find('=');
+    if (equals == std::string::npos) {
+      reporter.Error("", Quoted(text) + ": expected NAME=VALUE", kExitUsage);
+      continue;
+    }
+    Assignment assignment;
+    std::string error;
+    if (!ResolveName(text.substr(0, equals), assignment.name, error)) {
+      reporter.Error("", error, kExitUsage);
+      continue;
+    }
+    assignment.value = text.substr(equals + 1);
+    const std::string reason =
+        CheckValue(assignment.name.path, *assignment.name.entry, assignment.value);
+    if (!reason.empty()) {
+      reporter.Error(FileList(files), assignment.name.name + ": refused: " + reason, kExitUsage);
+      continue;
+    }
+    assignments.push_back(assignment);
+  }
+  std::vector<ResolvedName> deletions;
+  for (const auto& text : deletes) {
+    ResolvedName name;
+    std::string error;
+    if (!ResolveName(text, name, error)) {
+      reporter.Error("", error, kExitUsage);
+      continue;
+    }
+    deletions.push_back(name);
+  }
+  if (reporter.status() != kExitSuccess) {
+    std::cerr << "ovrameta: nothing was written" << std::endl;
+    return reporter.status();
+  }
+
+  Progress progress(files.size(), "files read");
+  reporter.SetProgress(&progress);
+  std::vector<OpenedFile> opened;
+  for (const auto& name : files) {
+    OpenedFile file;
+    if (OpenFile(name, reporter, file)) {
+      if (access(name.c_str(), W_OK) != 0) {
+        reporter.Error(name, std::string("cannot write file: ") + std::strerror(errno),
+                       kExitUsage);
+      } else {
+        opened.push_back(file);
+      }
+    }
+    progress.Step();
+  }
+  progress.Clear();
+  reporter.SetProgress(nullptr);
+  if (reporter.status() != kExitSuccess) {
+    std::cerr << "ovrameta: nothing was written" << std::endl;
+    return reporter.status();
+  }
+  for (auto& file : opened) {
+    // A file without XMP starts from an empty packet, so that it can take
+    // the new values.
+    if (!file.provider->MetaDataAccess()) file.provider->ResetToEmptyMetaData(false);
+  }
+
+  boost::shared_ptr<MetaDataProvider> target;
+  std::vector<std::string> names;
+  for (const auto& file : opened) names.push_back(file.name);
+  const std::string context = FileList(names);
+  if (opened.size() == 1) {
+    target = opened.front().provider;
+  } else {
+    auto aggregate = boost::make_shared<AggregateProvider>();
+    for (const auto& file : opened) aggregate->AddProvider(file.provider, false);
+    aggregate->OnProxyMetaDataChange(nullptr);
+    target = aggregate;
+  }
+  {
+    MetaDataUpdateAccess update(target);
+    XMPMetaRef xmp = *update;
+    if (!xmp) {
+      reporter.Error(context, "no metadata could be read; nothing was written", kExitUsage);
+      return reporter.status();
+    }
+    for (const auto& assignment : assignments) {
+      if (SetValue(xmp, assignment.name.path, assignment.value)) {
+        update.AddChange(assignment.name.path);
+        continue;
+      }
+      // Not written: either the value is already there, or the library
+      // could not write it.
+      UTF8String current;
+      if (!GetValue(xmp, assignment.name.path, current) || current != assignment.value) {
+        reporter.Error(context, assignment.name.name + ": the value could not be written",
+                       kExitUsage);
+      }
+    }
+    for (const auto& name : deletions) {
+      if (DeleteValue(xmp, name.path)) {
+        update.AddChange(name.path);
+      } else {
+        reporter.Error(context, name.name + ": no value to delete", kExitAbsent);
+      }
+    }
+    reporter.FlushLibrary(context);
+  }
+  reporter.FlushLibrary(context);
+  return reporter.status();
+}
+
+// ---------------------------------------------------------------------------
+// schemas
+
+namespace {
+
+void PrintEntry(std::ostream& out, const std::string& name, const EntryDefinition& entry,
+                bool internal, int depth, int nameWidth, std::set<std::string>& open);
+
+void PrintFields(std::ostream& out, const TypeDefinition& type, int depth,
+                 std::set<std::string>& open) {
+  // A structure that contains itself is listed once.
+  if (!open.insert(type.name).second) return;
+  std::size_t width = 0;
+  for (const auto& field : type.fields) {
+    if (field) width = std::max(width, field->prefix.size() + 1 + field->name.size());
+  }
+  for (const auto& field : type.fields) {
+    if (!field) continue;
+    PrintEntry(out, field->prefix + ":" + field->name, *field, false, depth,
+               static_cast<int>(width), open);
+  }
+  open.erase(type.name);
+}
+
+void PrintEntry(std::ostream& out, const std::string& name, const EntryDefinition& entry,
+                bool internal, int depth, int nameWidth, std::set<std::string>& open) {
+  const std::string indent(static_cast<std::size_t>(depth) * 2, ' ');
+  std::string padded = name;
+  if (static_cast<int>(padded.size()) < nameWidth) padded.append(nameWidth - padded.size(), ' ');
+  out << indent << padded << "  " << TypeText(entry);
+  out << "  " << LabelOr(entry.label, entry.name);
+  if (internal) out << "  (internal)";
+  out << '\n';
+  for (const auto& choice : ChoicesOf(entry)) {
+    if (!choice) continue;
+    const std::string label = ToUTF8(choice->label);
+    out << indent << "    = " << choice->rawValue
+        << (label.empty() || label == choice->rawValue ? "" : "  " + label) << '\n';
+  }
+  if (const auto type = PropertyTypeOf(entry)) {
+    if (!type->fields.empty()) PrintFields(out, *type, depth + 1, open);
+  }
+}
+
+}  // namespace
+
+int SchemasCommand(const std::string& prefix) {
+  Reporter reporter;
+  std::vector<SchemaDefinitionPtr> schemas;
+  if (prefix.empty()) {
+    schemas = KnownSchemas();
+  } else if (const auto schema = SchemaForPrefix(prefix)) {
+    schemas.push_back(schema);
+  } else {
+    reporter.Error("", "no schema is registered with the prefix " + Quoted(prefix) +
+                           " (ovrameta schemas lists them)",
+                   kExitUsage);
+    return reporter.status();
+  }
+  bool first = true;
+  for (const auto& schema : schemas) {
+    if (!first) std::cout << '\n';
+    first = false;
+    std::cout << schema->prefix << "  " << schema->namespaceURI << "  "
+              << LabelOr(schema->label, schema->prefix) << '\n';
+    std::size_t width = 0;
+    for (const auto& property : schema->properties) {
+      if (property) width = std::max(width, schema->prefix.size() + 1 + property->name.size());
+    }
+    std::set<std::string> open;
+    for (const auto& property : schema->properties) {
+      if (!property) continue;
+      PrintEntry(std::cout, schema->prefix + ":" + property->name, *property,
+                 property->isInternal, 1, static_cast<int>(width), open);
+    }
+  }
+  return reporter.status();
+}
+
+}  // namespace ovrameta

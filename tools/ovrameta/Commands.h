@@ -1,0 +1,42 @@
+// Private to the ovrameta tool (not part of the library's interface): the
+// four commands. Each returns the process exit status.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace ovrameta {
+
+enum ExitStatus {
+  kExitSuccess = 0,
+  kExitAbsent = 1,  // a named value is absent
+  kExitUsage = 2,   // a usage error or an unreadable file
+};
+
+struct GetOptions {
+  bool raw = false;
+  bool json = false;
+};
+
+int ShowCommand(const std::vector<std::string>& files, bool each);
+// arguments: files and names in any order (see SplitArguments).
+int GetCommand(const std::vector<std::string>& arguments, const GetOptions& options);
+// arguments: files and NAME=VALUE assignments in any order.
+int SetCommand(const std::vector<std::string>& arguments, const std::vector<std::string>& deletes);
+int SchemasCommand(const std::string& prefix);
+
+// Brings the library up for the lifetime of the object and relays the
+// problems it reports to standard error.
+class Session {
+ public:
+  Session();
+  ~Session();
+  Session(const Session&) = delete;
+  Session& operator=(const Session&) = delete;
+  bool ok() const { return mOk; }
+
+ private:
+  bool mOk = false;
+};
+
+}  // namespace ovrameta

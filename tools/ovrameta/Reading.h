@@ -1,0 +1,48 @@
+// Private to the ovrameta tool (not part of the library's interface):
+// reading the values of a packet into a tree of display nodes.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include <boost/optional.hpp>
+
+#include <ovrametadata/Definitions.h>
+#include <ovrametadata/Paths.h>
+
+namespace ovrameta {
+
+struct ValueNode {
+  enum Kind { kSimple, kStruct, kArray };
+
+  Kind kind = kSimple;
+  std::string name;       // "dc:subject", "xmpDM:duration/xmpDM:scale", "dc:subject[2]"
+  std::string label;      // the definition's label; "[2]" for an item
+  std::string typeText;   // see TypeText
+  std::string primitive;  // primitive type id; empty for a structure
+  bool mixed = false;     // values differ between the files of an aggregate
+  std::string value;      // display text (arrays: their items joined by "; ")
+  boost::optional<std::string> raw;  // stored text, when asked for and stored
+  std::vector<ValueNode> children;   // fields of a structure, items of an array
+};
+
+struct ReadOptions {
+  bool raw = false;    // also read the stored text of every value
+  bool items = true;   // read the items of arrays of simple values one by one
+};
+
+// Reads the value at path, named name. False when nothing is stored there
+// (and, for internal properties, nothing can be constructed).
+bool ReadValue(XMPMetaRef xmp, const ovrametadata::Path& path, const std::string& name,
+               const ReadOptions& options, ValueNode& out);
+
+struct SchemaValues {
+  ovrametadata::SchemaDefinitionPtr schema;
+  std::string label;
+  std::vector<ValueNode> values;
+};
+
+// Every known schema (see KnownSchemas) that has values in xmp, in order.
+std::vector<SchemaValues> ReadAllValues(XMPMetaRef xmp, const ReadOptions& options);
+
+}  // namespace ovrameta

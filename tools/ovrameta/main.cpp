@@ -1,0 +1,57 @@
+// ovrameta: shows and edits the XMP metadata of media files through
+// ovrametadata, the way a host application does.
+#include <iostream>
+#include <string>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+
+#include "Commands.h"
+
+int main(int argc, char** argv) {
+  CLI::App app{"Shows and edits the XMP metadata of media files."};
+  app.require_subcommand(1);
+  app.footer(
+      "Names are prefix:Property, prefix:Struct/prefix:Field or prefix:Array[n].\n"
+      "Exit status: 0 success, 1 a named value is absent, 2 usage error or unreadable file.");
+
+  std::vector<std::string> showFiles;
+  bool each = false;
+  auto* show = app.add_subcommand(
+      "show", "Show every value: of one file, or of several files as one aggregate");
+  show->add_option("FILE", showFiles, "Media files")->required();
+  show->add_flag("--each", each, "Show several files one by one instead of as an aggregate");
+
+  std::vector<std::string> getArguments;
+  ovrameta::GetOptions getOptions;
+  auto* get = app.add_subcommand("get", "Show the display value of named properties");
+  get->add_option("ARGS", getArguments, "FILE... NAME...")->required();
+  get->add_flag("--raw", getOptions.raw, "The stored text instead of the display value");
+  get->add_flag("--json", getOptions.json,
+                "Machine-readable output with types (all properties when no NAME is given)");
+
+  std::vector<std::string> setArguments;
+  std::vector<std::string> deletes;
+  auto* set = app.add_subcommand("set", "Write values, checked against the definitions");
+  set->add_option("ARGS", setArguments, "FILE... NAME=VALUE...")->required();
+  set->add_option("--delete", deletes, "Delete the value of NAME")->expected(1, -1);
+
+  std::string schemaPrefix;
+  auto* schemas = app.add_subcommand("schemas", "List the registered schemas and their properties");
+  schemas->add_option("PREFIX", schemaPrefix, "Only the schema with this prefix");
+
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    const int status = app.exit(error);
+    return status == 0 ? 0 : ovrameta::kExitUsage;
+  }
+
+  ovrameta::Session session;
+  if (!session.ok()) return ovrameta::kExitUsage;
+  if (*show) return ovrameta::ShowCommand(showFiles, each);
+  if (*get) return ovrameta::GetCommand(getArguments, getOptions);
+  if (*set) return ovrameta::SetCommand(setArguments, deletes);
+  if (*schemas) return ovrameta::SchemasCommand(schemaPrefix);
+  return ovrameta::kExitUsage;
+}
