@@ -162,35 +162,23 @@ TEST_F(FormatRegistry, NewerPropertiesFallBackToTheirOlderTwins) {
   }
 }
 
-TEST_F(FormatRegistry, FallbacksGoOneWayOnly) {
+TEST_F(FormatRegistry, NothingConstructedWithoutAUsableEntry) {
+  // Fallbacks go one way only; a missing fallback value or packet gives
+  // nothing; paths without any entry give nothing.
   ovraxmp::XMPMeta meta = Packet(
-      "<exifEX:LensModel>50mm</exifEX:LensModel>"
+      "<exifEX:LensModel>50mm</exifEX:LensModel><aux:OwnerName>Kim</aux:OwnerName>"
       "<exif:GPSHPositioningError>7/1</exif:GPSHPositioningError>");
-  UTF8String value = "untouched";
-  EXPECT_FALSE(GetConstructedValue(meta.GetInternalRef(), P(kNamespace_ExifAUX, "Lens"), value,
-                                   nullptr));
-  EXPECT_FALSE(GetConstructedValue(meta.GetInternalRef(),
-                                   P(kNamespace_ExifEX, "GPSHPositioningError"), value, nullptr));
-  EXPECT_EQ("untouched", value);
-}
-
-TEST_F(FormatRegistry, MissingFallbackValueGivesNothing) {
-  ovraxmp::XMPMeta meta = Packet("<aux:OwnerName>Kim</aux:OwnerName>");
+  const Path paths[] = {P(kNamespace_ExifAUX, "Lens"), P(kNamespace_ExifEX, "GPSHPositioningError"),
+                        P(kNamespace_ExifEX, "BodySerialNumber"), P(kTestNS, "Note"), Path()};
+  for (const Path& path : paths) {
+    UTF8String value = "untouched";
+    EXPECT_FALSE(GetConstructedValue(meta.GetInternalRef(), path, value, nullptr)) << path.description;
+    EXPECT_EQ("untouched", value);
+  }
   UTF8String value = "untouched";
   GetValueResult result = ValueFound;
-  EXPECT_FALSE(GetConstructedValue(meta.GetInternalRef(), P(kNamespace_ExifEX, "LensModel"),
-                                   value, &result));
+  EXPECT_FALSE(GetConstructedValue(nullptr, P(kNamespace_ExifEX, "CameraOwnerName"), value, &result));
   EXPECT_EQ(ValueAbsent, result);
-  EXPECT_FALSE(GetConstructedValue(nullptr, P(kNamespace_ExifEX, "LensModel"), value, &result));
-  EXPECT_EQ(ValueAbsent, result);
-  EXPECT_EQ("untouched", value);
-}
-
-TEST_F(FormatRegistry, PathWithoutFallbackOrAggregatorGivesNothing) {
-  ovraxmp::XMPMeta meta = Packet("<aux:Lens>24-70mm</aux:Lens>");
-  UTF8String value = "untouched";
-  EXPECT_FALSE(GetConstructedValue(meta.GetInternalRef(), P(kTestNS, "Note"), value, nullptr));
-  EXPECT_FALSE(GetConstructedValue(meta.GetInternalRef(), Path(), value, nullptr));
   EXPECT_EQ("untouched", value);
 }
 
@@ -211,31 +199,23 @@ Constructed Construct(const ovraxmp::XMPMeta& meta, const char* name) {
   return c;
 }
 
-TEST_F(FormatRegistry, ImageSizeFromExifPixelDimensions) {
+TEST_F(FormatRegistry, ImageSizeFollowsTheOrientation) {
   const std::string exif =
       "<exif:PixelXDimension>4000</exif:PixelXDimension>"
       "<exif:PixelYDimension>3000</exif:PixelYDimension>"
       "<tiff:ImageWidth>10</tiff:ImageWidth><tiff:ImageLength>20</tiff:ImageLength>";
-  Constructed c = Construct(Packet(exif), "ImageSize");
-  EXPECT_TRUE(c.ok);
-  EXPECT_EQ("4000 x 3000", c.value);
-  EXPECT_EQ(ValueFound, c.result);
-
-  c = Construct(Packet(exif + "<tiff:Orientation>1</tiff:Orientation>"), "ImageSize");
-  EXPECT_EQ("4000 x 3000", c.value);
-  c = Construct(Packet(exif + "<tiff:Orientation>3</tiff:Orientation>"), "ImageSize");
-  EXPECT_EQ("4000 x 3000", c.value);
-}
-
-TEST_F(FormatRegistry, ImageSizeFollowsRotatedOrientations) {
-  const std::string exif =
-      "<exif:PixelXDimension>4000</exif:PixelXDimension>"
-      "<exif:PixelYDimension>3000</exif:PixelYDimension>";
-  for (const char* orientation : {"5", "6", "7", "8"}) {
-    const Constructed c = Construct(
-        Packet(exif + "<tiff:Orientation>" + orientation + "</tiff:Orientation>"), "ImageSize");
-    EXPECT_TRUE(c.ok) << orientation;
-    EXPECT_EQ("3000 x 4000", c.value) << orientation;
+  const Constructed plain = Construct(Packet(exif), "ImageSize");
+  EXPECT_TRUE(plain.ok);
+  EXPECT_EQ("4000 x 3000", plain.value);
+  EXPECT_EQ(ValueFound, plain.result);
+  // Only 5 to 8 turn the image by a quarter.
+  for (const char* orientation : {"1", "2", "3", "4", "5", "6", "7", "8", "9"}) {
+    const bool rotated = orientation[0] >= '5' && orientation[0] <= '8';
+    EXPECT_EQ(rotated ? "3000 x 4000" : "4000 x 3000",
+              Construct(Packet(exif + "<tiff:Orientation>" + orientation + "</tiff:Orientation>"),
+                        "ImageSize")
+                  .value)
+        << orientation;
   }
 }
 
@@ -333,13 +313,19 @@ std::string Sensitivity(int value, const char* type) {
 }
 
 TEST_F(FormatRegistry, SensitivityPrefixFollowsTheSensitivityType) {
-  EXPECT_EQ("ISO 12800", Construct(Packet(Sensitivity(-1, nullptr)), "PhotographicSensitivity").value);
-  EXPECT_EQ("ISO 12800", Construct(Packet(Sensitivity(400, "2")), "PhotographicSensitivity").value);
-  EXPECT_EQ("SOS 12800", Construct(Packet(Sensitivity(65535, "1")), "PhotographicSensitivity").value);
-  EXPECT_EQ("REI 12800", Construct(Packet(Sensitivity(65535, "2")), "PhotographicSensitivity").value);
-  EXPECT_EQ("ISO 12800", Construct(Packet(Sensitivity(65535, "3")), "PhotographicSensitivity").value);
-  EXPECT_EQ("SOS 12800", Construct(Packet(Sensitivity(65535, "4")), "PhotographicSensitivity").value);
-  EXPECT_EQ("ISO 12800", Construct(Packet(Sensitivity(65535, nullptr)), "PhotographicSensitivity").value);
+  const struct {
+    int sensitivity;
+    const char* type;
+    const char* expected;
+  } cases[] = {{-1, nullptr, "ISO 12800"},   {400, "2", "ISO 12800"},
+               {65535, "1", "SOS 12800"},    {65535, "2", "REI 12800"},
+               {65535, "3", "ISO 12800"},    {65535, "4", "SOS 12800"},
+               {65535, nullptr, "ISO 12800"}};
+  for (const auto& c : cases) {
+    EXPECT_EQ(c.expected,
+              Construct(Packet(Sensitivity(c.sensitivity, c.type)), "PhotographicSensitivity").value)
+        << c.sensitivity << " " << (c.type ? c.type : "-");
+  }
 }
 
 TEST_F(FormatRegistry, SensitivityNeedsARatingAndASingleSensitivity) {
