@@ -61,6 +61,22 @@ std::string WrapBareRDF(const char* buffer, std::size_t length) {
 
 }  // namespace
 
+namespace detail {
+XmpPtr DeepCopy(XmpPtr xmp) {
+  XmpString text;
+  if (!xmp_serialize(xmp, text, kXMP_OmitPacketWrapper | kXMP_UseCompactFormat | kXMP_OmitAllFormatting, 0))
+    ThrowLastError(kXMPErr_BadSerialize, "copying an XMP packet");
+  XmpPtr copy = xmp_new_empty();
+  if (!copy) ThrowLastError(kXMPErr_NoMemory, "copying an XMP packet");
+  if (!xmp_parse(copy, xmp_string_cstr(text), xmp_string_len(text))) {
+    const int id = xmp_get_error();
+    xmp_free(copy);
+    Throw(id != 0 ? id : kXMPErr_BadParse, "copying an XMP packet");
+  }
+  return copy;
+}
+}  // namespace detail
+
 // ---- whole packet ----
 
 void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_OptionBits options) {
@@ -102,8 +118,7 @@ void XMPMeta::SerializeToBuffer(std::string* out, XMP_OptionBits options, std::u
     const bool hasTransient = it && xmp_iterator_next(it, nullptr, nullptr, nullptr, nullptr);
     if (it) xmp_iterator_free(it);
     if (hasTransient) {
-      toWrite = xmp_copy(xmp);
-      if (!toWrite) detail::ThrowLastError(kXMPErr_NoMemory, "copying an XMP packet");
+      toWrite = detail::DeepCopy(xmp);
       XMPMeta copy(detail::NewPacket(toWrite));
       XMPMetaRefRelease(copy.GetInternalRef());  // the holder keeps the only reference
       XMPUtils::RemoveProperties(&copy, kXMP_NS_Transient, std::string(), kXMPUtil_DoAllProperties);
@@ -122,8 +137,7 @@ void XMPMeta::SerializeToBuffer(std::string* out, XMP_OptionBits options, std::u
 
 XMPMeta XMPMeta::Clone(XMP_OptionBits) const {
   XMPPacket& packet = detail::Require(mRef);
-  XmpPtr copy = xmp_copy(packet.Xmp());
-  if (!copy) detail::ThrowLastError(kXMPErr_NoMemory, "copying an XMP packet");
+  XmpPtr copy = detail::DeepCopy(packet.Xmp());
   XMPPacket* clone = detail::NewPacket(copy);
   clone->Marks() = packet.Marks();
   XMPMeta result(clone);
@@ -304,6 +318,17 @@ void XMPMeta::AppendArrayItem(const std::string& ns, const std::string& arrayNam
   RequireArray(xmp, ns, arrayName, &exists);
   if (!exists && !(arrayOptions & kXMP_PropArrayFormMask))
     detail::Throw(kXMPErr_BadOptions, "appending to \"" + arrayName + "\" needs an array form");
+  if (options & kXMP_PropCompositeMask) {
+    // The toolkit's append insists on a string value; composite items are
+    // created through their item path instead.
+    if (!value.empty()) detail::Throw(kXMPErr_BadXPath, "composite array items have no value");
+    if (!exists && !xmp_set_property(xmp, ns.c_str(), arrayName.c_str(), "", arrayOptions & kXMP_PropArrayFormMask))
+      Fail("creating", ns, arrayName);
+    const std::string item = arrayName + "[" + std::to_string(CountArrayItems(ns, arrayName) + 1) + "]";
+    if (!xmp_set_property(xmp, ns.c_str(), item.c_str(), "", options & kXMP_PropCompositeMask))
+      Fail("appending to", ns, arrayName);
+    return;
+  }
   if (!xmp_append_array_item(xmp, ns.c_str(), arrayName.c_str(), exists ? 0 : arrayOptions, value.c_str(),
                              options))
     Fail("appending to", ns, arrayName);

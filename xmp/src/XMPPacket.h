@@ -86,6 +86,9 @@ void ForgetNamespaces();
 // "dc:title" and "title" name the same node in the multi-value marks.
 std::string NormalizedPath(const std::string& schemaNS, const std::string& path);
 
+// A deep copy of a toolkit object (the toolkit's own copy shares the tree).
+XmpPtr DeepCopy(XmpPtr xmp);
+
 // A packet that is not null, else kXMPErr_BadObject.
 XMPPacket& Require(XMPMetaRef ref);
 

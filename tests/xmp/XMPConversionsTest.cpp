@@ -1,0 +1,139 @@
+// Text forms of values and date arithmetic.
+#include <string>
+
+#include <gtest/gtest.h>
+
+#include <ovraxmp/XMPToolkit.h>
+
+using namespace ovraxmp;
+
+namespace {
+
+std::string RoundTrip(const std::string& text) {
+  XMP_DateTime date;
+  XMPUtils::ConvertToDate(text, &date);
+  std::string back;
+  XMPUtils::ConvertFromDate(date, &back);
+  return back;
+}
+
+int ErrorOf(void (*call)()) {
+  try {
+    call();
+  } catch (const XMP_Error& e) {
+    return e.GetID();
+  }
+  return 0;
+}
+
+}  // namespace
+
+TEST(XMPConversions, EveryIsoFormXmpAllowsRoundTrips) {
+  for (const char* text : {"2024", "2024-03", "2024-03-05", "2024-03-05T07:08", "2024-03-05T07:08:09",
+                           "2024-03-05T07:08:09.5", "2024-03-05T07:08:09.123456789", "2024-03-05T07:08Z",
+                           "2024-03-05T07:08:09+02:00", "2024-03-05T07:08:09.25-05:30", "0850-01-01",
+                           "T07:08:09Z"}) {
+    EXPECT_EQ(RoundTrip(text), text);
+  }
+  EXPECT_EQ(RoundTrip(" 2024-03-05T07:08:09+0200 "), "2024-03-05T07:08:09+02:00");
+  EXPECT_EQ(RoundTrip("2024-03-05T07:08:09+00:00"), "2024-03-05T07:08:09Z");
+  EXPECT_EQ(RoundTrip("2024-03-05T07:08:00"), "2024-03-05T07:08");
+  EXPECT_EQ(RoundTrip("07:08"), "T07:08");
+}
+
+TEST(XMPConversions, DateFieldsAndFlags) {
+  XMP_DateTime d;
+  XMPUtils::ConvertToDate("2024-03", &d);
+  EXPECT_TRUE(d.hasDate);
+  EXPECT_FALSE(d.hasTime);
+  EXPECT_EQ(d.year, 2024);
+  EXPECT_EQ(d.month, 3);
+  EXPECT_EQ(d.day, 0);
+  XMPUtils::ConvertToDate("2024-03-05T23:59:58.000000001-08:30", &d);
+  EXPECT_TRUE(d.hasTime);
+  EXPECT_TRUE(d.hasTimeZone);
+  EXPECT_EQ(d.tzSign, -1);
+  EXPECT_EQ(d.tzHour, 8);
+  EXPECT_EQ(d.tzMinute, 30);
+  EXPECT_EQ(d.nanoSecond, 1);
+  XMPUtils::ConvertToDate("2024-03-05T10:00", &d);
+  EXPECT_FALSE(d.hasTimeZone);
+}
+
+TEST(XMPConversions, MalformedDatesRaiseBadValue) {
+  for (const char* text : {"", "hello", "2024-13", "2024-00-10", "2024-02-32", "2024-03-05T25:00",
+                           "2024-03-05T10:61", "2024-03-05T10:00:60", "2024-03-05 10:00", "2024-03-05T10",
+                           "2024-03-05T10:00+25:00", "2024-03-05T10:00Zjunk", "2024/03/05", "2024-3-5",
+                           "2024-03-05T10:00:00."}) {
+    XMP_DateTime d;
+    try {
+      XMPUtils::ConvertToDate(text, &d);
+      ADD_FAILURE() << "accepted \"" << text << "\"";
+    } catch (const XMP_Error& e) {
+      EXPECT_EQ(e.GetID(), kXMPErr_BadValue) << text;
+    }
+  }
+}
+
+TEST(XMPConversions, UtcConversionCarriesAcrossDaysMonthsAndYears) {
+  XMP_DateTime d;
+  XMPUtils::ConvertToDate("2024-01-01T01:30:00+02:00", &d);
+  XMPUtils::ConvertToUTCTime(&d);
+  std::string text;
+  XMPUtils::ConvertFromDate(d, &text);
+  EXPECT_EQ(text, "2023-12-31T23:30Z");
+  XMPUtils::ConvertToDate("2024-02-28T22:00:00-05:00", &d);  // leap year
+  XMPUtils::ConvertToUTCTime(&d);
+  XMPUtils::ConvertFromDate(d, &text);
+  EXPECT_EQ(text, "2024-02-29T03:00Z");
+  XMPUtils::ConvertToDate("2024-03-05", &d);  // no time: unchanged
+  XMPUtils::ConvertToUTCTime(&d);
+  XMPUtils::ConvertFromDate(d, &text);
+  EXPECT_EQ(text, "2024-03-05");
+}
+
+TEST(XMPConversions, LocalTimeAndNowAreTheSameInstant) {
+  XMP_DateTime d;
+  XMPUtils::ConvertToDate("2024-06-15T12:00:00Z", &d);
+  XMP_DateTime local = d;
+  XMPUtils::ConvertToLocalTime(&local);
+  EXPECT_TRUE(local.hasTimeZone);
+  EXPECT_EQ(XMPUtils::CompareDateTime(local, d), 0);
+  XMP_DateTime now;
+  XMPUtils::CurrentDateTime(&now);
+  EXPECT_TRUE(now.hasDate && now.hasTime && now.hasTimeZone);
+  EXPECT_GT(XMPUtils::CompareDateTime(now, d), 0);
+  XMP_DateTime later;
+  XMPUtils::ConvertToDate("2024-06-15T12:00:01+00:00", &later);
+  EXPECT_LT(XMPUtils::CompareDateTime(d, later), 0);
+}
+
+TEST(XMPConversions, NumbersAndBooleans) {
+  EXPECT_EQ(XMPUtils::ConvertToInt64(" -9223372036854775808 "), INT64_MIN);
+  EXPECT_EQ(XMPUtils::ConvertToInt64("+17"), 17);
+  EXPECT_EQ(XMPUtils::ConvertToInt64("0x1F"), 31);
+  EXPECT_EQ(XMPUtils::ConvertToInt("-2147483648"), INT32_MIN);
+  EXPECT_DOUBLE_EQ(XMPUtils::ConvertToFloat(" 1.5e3 "), 1500.0);
+  EXPECT_DOUBLE_EQ(XMPUtils::ConvertToFloat("-0.25"), -0.25);
+  EXPECT_TRUE(XMPUtils::ConvertToBool("True"));
+  EXPECT_TRUE(XMPUtils::ConvertToBool(" t"));
+  EXPECT_TRUE(XMPUtils::ConvertToBool("1"));
+  EXPECT_FALSE(XMPUtils::ConvertToBool("FALSE"));
+  EXPECT_FALSE(XMPUtils::ConvertToBool("0"));
+  std::string text;
+  XMPUtils::ConvertFromInt64(INT64_MIN, &text);
+  EXPECT_EQ(text, "-9223372036854775808");
+  XMPUtils::ConvertFromBool(false, &text);
+  EXPECT_EQ(text, "False");
+  XMPUtils::ConvertFromFloat(1.0 / 3, "", &text);
+  EXPECT_EQ(text, "0.333333");
+  XMPUtils::ConvertFromFloat(1.0 / 3, "%.3g", &text);
+  EXPECT_EQ(text, "0.333");
+  EXPECT_EQ(ErrorOf([] { XMPUtils::ConvertToInt64("9223372036854775808"); }), kXMPErr_BadValue);
+  EXPECT_EQ(ErrorOf([] { XMPUtils::ConvertToInt64("12abc"); }), kXMPErr_BadValue);
+  EXPECT_EQ(ErrorOf([] { XMPUtils::ConvertToInt64(""); }), kXMPErr_BadValue);
+  EXPECT_EQ(ErrorOf([] { XMPUtils::ConvertToInt("2147483648"); }), kXMPErr_BadValue);
+  EXPECT_EQ(ErrorOf([] { XMPUtils::ConvertToFloat("1.5x"); }), kXMPErr_BadValue);
+  EXPECT_EQ(ErrorOf([] { XMPUtils::ConvertToFloat("--1"); }), kXMPErr_BadValue);
+  EXPECT_EQ(ErrorOf([] { XMPUtils::ConvertToBool("yes"); }), kXMPErr_BadValue);
+}

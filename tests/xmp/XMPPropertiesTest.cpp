@@ -1,0 +1,371 @@
+// Parsing, serialising and the property operations of XMPMeta.
+#include <string>
+
+#include <gtest/gtest.h>
+
+#include "XMPTestUtil.h"
+
+using namespace ovraxmp;
+using xmptest::Get;
+using xmptest::kTestNS;
+
+namespace {
+
+class XMPProperties : public ::testing::Test {
+ protected:
+  void SetUp() override { xmptest::RegisterTestNamespace(); }
+};
+
+}  // namespace
+
+TEST_F(XMPProperties, RealWorldPacketSurvivesSerialiseAndReparse) {
+  const XMPMeta original = xmptest::Parse(xmptest::RealWorldPacket());
+  for (const std::string& text : {xmptest::Serialize(original), [&] {
+         std::string compact;
+         original.SerializeToBuffer(&compact, kXMP_UseCompactFormat | kXMP_OmitPacketWrapper);
+         return compact;
+       }()}) {
+    const XMPMeta again = xmptest::Parse(text);
+    EXPECT_EQ(Get(again, kXMP_NS_XMP, "Rating"), "4");
+    EXPECT_EQ(Get(again, kXMP_NS_Photoshop, "City"), "Zürich");
+    EXPECT_EQ(again.CountArrayItems(kXMP_NS_DC, "creator"), 2);
+    EXPECT_EQ(Get(again, kXMP_NS_DC, "creator[2]"), "Bo Chen");
+    EXPECT_EQ(Get(again, kXMP_NS_DC, "subject[2]"), "dusk; blue hour");
+    EXPECT_EQ(Get(again, kXMP_NS_DC, "subject[3]"), "\"quoted\"");
+    std::string lang, value;
+    ASSERT_TRUE(again.GetLocalizedText(kXMP_NS_DC, "title", "fr", "fr-CH", &lang, &value));
+    EXPECT_EQ(lang, "fr-CH");
+    EXPECT_EQ(value, "Lac au crépuscule");
+    std::string field;
+    ASSERT_TRUE(again.GetStructField(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "documentID", &field));
+    EXPECT_EQ(field, "xmp.did:66666666-7777-8888-9999-000000000000");
+    EXPECT_EQ(Get(again, kXMP_NS_XMP_MM, "History[1]/stEvt:action"), "created");
+    std::string qual;
+    ASSERT_TRUE(again.GetQualifier(kXMP_NS_DM, "shotName", kXMP_NS_DM, "good", &qual));
+    EXPECT_EQ(qual, "True");
+    EXPECT_EQ(Get(again, kXMP_NS_DM, "shotName"), "Take 7");
+  }
+}
+
+TEST_F(XMPProperties, SerialiseHonoursNewlineIndentAndPadding) {
+  XMPMeta meta;
+  meta.SetProperty(kTestNS, "A", "1");
+  std::string text;
+  meta.SerializeToBuffer(&text, kXMP_OmitPacketWrapper, 0, "\r\n", "\t", 2);
+  EXPECT_NE(text.find("\r\n\t\t\t<rdf:RDF"), std::string::npos) << text;
+  std::string padded, plain;
+  meta.SerializeToBuffer(&plain, 0, 10);
+  meta.SerializeToBuffer(&padded, 0, 4000);
+  EXPECT_GT(padded.size(), plain.size() + 3000);
+  testing::internal::CaptureStderr();
+  EXPECT_THROW(meta.SerializeToBuffer(&text, kXMP_OmitPacketWrapper | kXMP_ExactPacketLength, 10), XMP_Error);
+  testing::internal::GetCapturedStderr();
+}
+
+TEST_F(XMPProperties, ParseAcceptsBareRdfAndEmptyAndRejectsMalformed) {
+  const std::string bare =
+      "<?xml version=\"1.0\"?><rdf:RDF xmlns:rdf=\"http://www.w3.org/1999/02/22-rdf-syntax-ns#\">"
+      "<rdf:Description rdf:about=\"\" xmlns:xmp=\"http://ns.adobe.com/xap/1.0/\" xmp:Label=\"bare\"/></rdf:RDF>";
+  EXPECT_EQ(Get(xmptest::Parse(bare), kXMP_NS_XMP, "Label"), "bare");
+  XMPMeta meta;
+  meta.SetProperty(kTestNS, "Old", "x");
+  meta.SetMultiValued(kTestNS, "Old");
+  meta.ParseFromBuffer(std::string());
+  EXPECT_FALSE(meta.DoesPropertyExist(kTestNS, "Old"));
+  EXPECT_FALSE(meta.IsMultiValued(kTestNS, "Old"));
+  for (const std::string& bad : {std::string("<x:xmpmeta xmlns:x=\"adobe:ns:meta/\"><rdf:RDF"),
+                                std::string("\x01\x02 not xml at all <<<")}) {
+    XMPMeta target;
+    target.SetProperty(kTestNS, "Kept", "yes");
+    testing::internal::CaptureStderr();
+    EXPECT_THROW(target.ParseFromBuffer(bad), XMP_Error);
+    testing::internal::GetCapturedStderr();
+    EXPECT_EQ(Get(target, kTestNS, "Kept"), "yes");  // a failed parse leaves the packet alone
+  }
+}
+
+TEST_F(XMPProperties, SimpleGetSetDeleteExists) {
+  XMPMeta meta;
+  std::string value = "untouched";
+  XMP_OptionBits options = 77;
+  EXPECT_FALSE(meta.GetProperty(kTestNS, "Name", &value, &options));
+  EXPECT_EQ(value, "untouched");
+  EXPECT_EQ(options, 77u);
+  meta.SetProperty(kTestNS, "Name", "first");
+  meta.SetProperty(kTestNS, "ovt:Name", "second");  // prefixed form names the same node
+  EXPECT_TRUE(meta.GetProperty(kTestNS, "Name", &value, &options));
+  EXPECT_EQ(value, "second");
+  EXPECT_EQ(options & kXMP_PropCompositeMask, 0u);
+  EXPECT_TRUE(meta.DoesPropertyExist(kTestNS, "Name"));
+  meta.DeleteProperty(kTestNS, "Name");
+  meta.DeleteProperty(kTestNS, "Name");
+  EXPECT_FALSE(meta.DoesPropertyExist(kTestNS, "Name"));
+  // Unregistered namespaces: reads answer false, writes raise bad-schema.
+  EXPECT_FALSE(meta.GetProperty("http://ovra.test/unregistered/", "X", &value));
+  EXPECT_FALSE(meta.DoesPropertyExist("http://ovra.test/unregistered/", "X"));
+  try {
+    meta.SetProperty("http://ovra.test/unregistered/", "X", "1");
+    FAIL() << "no error";
+  } catch (const XMP_Error& e) {
+    EXPECT_EQ(e.GetID(), kXMPErr_BadSchema);
+  }
+}
+
+TEST_F(XMPProperties, HolderWithoutPacketRaisesBadObject) {
+  XMPMeta none(nullptr);
+  try {
+    none.GetProperty(kTestNS, "A", nullptr);
+    FAIL() << "no error";
+  } catch (const XMP_Error& e) {
+    EXPECT_EQ(e.GetID(), kXMPErr_BadObject);
+  }
+}
+
+TEST_F(XMPProperties, TypedValuesUseTheTextForms) {
+  XMPMeta meta;
+  meta.SetProperty_Bool(kTestNS, "B", true);
+  meta.SetProperty_Int(kTestNS, "I", -42);
+  meta.SetProperty_Int64(kTestNS, "L", -1234567890123LL);
+  meta.SetProperty_Float(kTestNS, "F", 2.5);
+  XMP_DateTime date;
+  XMPUtils::ConvertToDate("2024-03-05T07:08:09.25+02:00", &date);
+  meta.SetProperty_Date(kTestNS, "D", date);
+  EXPECT_EQ(Get(meta, kTestNS, "B"), "True");
+  EXPECT_EQ(Get(meta, kTestNS, "I"), "-42");
+  EXPECT_EQ(Get(meta, kTestNS, "L"), "-1234567890123");
+  EXPECT_EQ(Get(meta, kTestNS, "F"), "2.500000");
+  EXPECT_EQ(Get(meta, kTestNS, "D"), "2024-03-05T07:08:09.25+02:00");
+  bool b = false;
+  std::int32_t i = 0;
+  std::int64_t l = 0;
+  double f = 0;
+  XMP_DateTime d;
+  EXPECT_TRUE(meta.GetProperty_Bool(kTestNS, "B", &b));
+  EXPECT_TRUE(meta.GetProperty_Int(kTestNS, "I", &i));
+  EXPECT_TRUE(meta.GetProperty_Int64(kTestNS, "L", &l));
+  EXPECT_TRUE(meta.GetProperty_Float(kTestNS, "F", &f));
+  EXPECT_TRUE(meta.GetProperty_Date(kTestNS, "D", &d));
+  EXPECT_TRUE(b);
+  EXPECT_EQ(i, -42);
+  EXPECT_EQ(l, -1234567890123LL);
+  EXPECT_DOUBLE_EQ(f, 2.5);
+  EXPECT_EQ(d.nanoSecond, 250000000);
+  EXPECT_EQ(d.tzSign, 1);
+  EXPECT_FALSE(meta.GetProperty_Int(kTestNS, "Missing", &i));
+  EXPECT_THROW(meta.GetProperty_Int(kTestNS, "L", &i), XMP_Error);  // out of 32-bit range
+  meta.SetProperty(kTestNS, "Text", "abc");
+  try {
+    meta.GetProperty_Float(kTestNS, "Text", &f);
+    FAIL() << "no error";
+  } catch (const XMP_Error& e) {
+    EXPECT_EQ(e.GetID(), kXMPErr_BadValue);
+  }
+}
+
+TEST_F(XMPProperties, ArraysAppendInsertCountAndDelete) {
+  XMPMeta meta;
+  EXPECT_EQ(meta.CountArrayItems(kTestNS, "List"), 0);
+  EXPECT_THROW(meta.AppendArrayItem(kTestNS, "List", 0, "x"), XMP_Error);  // no form for a new array
+  meta.AppendArrayItem(kTestNS, "List", kXMP_PropArrayIsOrdered, "b");
+  meta.AppendArrayItem(kTestNS, "List", 0, "d");
+  meta.SetArrayItem(kTestNS, "List", 1, "a", kXMP_InsertBeforeItem);
+  meta.SetArrayItem(kTestNS, "List", 2, "c", kXMP_InsertAfterItem);
+  meta.SetArrayItem(kTestNS, "List", kXMP_ArrayLastItem, "c2", kXMP_InsertBeforeItem);
+  meta.SetArrayItem(kTestNS, "List", 6, "e");  // count + 1 appends
+  // a b c c2 d e
+  ASSERT_EQ(meta.CountArrayItems(kTestNS, "List"), 6);
+  const char* expected[] = {"a", "b", "c", "c2", "d", "e"};
+  for (int i = 1; i <= 6; ++i) {
+    std::string item;
+    EXPECT_TRUE(meta.GetArrayItem(kTestNS, "List", i, &item));
+    EXPECT_EQ(item, expected[i - 1]);
+  }
+  std::string last;
+  EXPECT_TRUE(meta.GetArrayItem(kTestNS, "List", kXMP_ArrayLastItem, &last));
+  EXPECT_EQ(last, "e");
+  XMP_OptionBits form = 0;
+  meta.GetProperty(kTestNS, "List", nullptr, &form);
+  EXPECT_EQ(form & kXMP_PropArrayFormMask, kXMP_PropValueIsArray | kXMP_PropArrayIsOrdered);
+  EXPECT_FALSE(meta.GetArrayItem(kTestNS, "List", 7, &last));
+  meta.DeleteArrayItem(kTestNS, "List", 2);
+  meta.DeleteArrayItem(kTestNS, "List", kXMP_ArrayLastItem);
+  EXPECT_EQ(meta.CountArrayItems(kTestNS, "List"), 4);
+  EXPECT_EQ(Get(meta, kTestNS, "List[2]"), "c");
+  EXPECT_TRUE(meta.DoesArrayItemExist(kTestNS, "List", 4));
+  EXPECT_FALSE(meta.DoesArrayItemExist(kTestNS, "List", 5));
+  // Errors: bad index, item beyond the end, a simple property used as array.
+  for (XMP_Index bad : {0, -2}) {
+    try {
+      meta.GetArrayItem(kTestNS, "List", bad, &last);
+      FAIL() << "no error";
+    } catch (const XMP_Error& e) {
+      EXPECT_EQ(e.GetID(), kXMPErr_BadIndex);
+    }
+  }
+  EXPECT_THROW(meta.SetArrayItem(kTestNS, "List", 9, "z"), XMP_Error);
+  meta.SetProperty(kTestNS, "Simple", "s");
+  try {
+    meta.CountArrayItems(kTestNS, "Simple");
+    FAIL() << "no error";
+  } catch (const XMP_Error& e) {
+    EXPECT_EQ(e.GetID(), kXMPErr_BadXPath);
+  }
+}
+
+TEST_F(XMPProperties, LargeArrayCountIsExact) {
+  XMPMeta meta;
+  for (int i = 0; i < 37; ++i) meta.AppendArrayItem(kTestNS, "Bag", kXMP_PropValueIsArray, std::to_string(i));
+  EXPECT_EQ(meta.CountArrayItems(kTestNS, "Bag"), 37);
+}
+
+TEST_F(XMPProperties, StructFieldsAndQualifiers) {
+  XMPMeta meta;
+  meta.SetStructField(kTestNS, "Place", kXMP_NS_DC, "title", "Harbour");
+  meta.SetStructField(kTestNS, "Place", kTestNS, "Code", "42");
+  std::string value;
+  XMP_OptionBits options = 0;
+  ASSERT_TRUE(meta.GetProperty(kTestNS, "Place", &value, &options));
+  EXPECT_TRUE(options & kXMP_PropValueIsStruct);
+  EXPECT_TRUE(meta.GetStructField(kTestNS, "Place", kXMP_NS_DC, "title", &value));
+  EXPECT_EQ(value, "Harbour");
+  EXPECT_EQ(Get(meta, kTestNS, "Place/ovt:Code"), "42");
+  meta.DeleteStructField(kTestNS, "Place", kTestNS, "Code");
+  EXPECT_FALSE(meta.DoesStructFieldExist(kTestNS, "Place", kTestNS, "Code"));
+  EXPECT_TRUE(meta.DoesStructFieldExist(kTestNS, "Place", kXMP_NS_DC, "title"));
+  EXPECT_FALSE(meta.GetStructField(kTestNS, "NoStruct", kXMP_NS_DC, "title", &value));
+  meta.SetProperty(kTestNS, "Plain", "p");
+  EXPECT_THROW(meta.GetStructField(kTestNS, "Plain", kXMP_NS_DC, "title", &value), XMP_Error);
+  try {
+    meta.SetStructField(kTestNS, "Place", "http://ovra.test/unregistered/", "F", "v");
+    FAIL() << "no error";
+  } catch (const XMP_Error& e) {
+    EXPECT_EQ(e.GetID(), kXMPErr_BadSchema);
+  }
+
+  meta.SetQualifier(kTestNS, "Plain", kTestNS, "Unit", "mm");
+  EXPECT_TRUE(meta.DoesQualifierExist(kTestNS, "Plain", kTestNS, "Unit"));
+  EXPECT_TRUE(meta.GetQualifier(kTestNS, "Plain", kTestNS, "Unit", &value, &options));
+  EXPECT_EQ(value, "mm");
+  EXPECT_TRUE(options & kXMP_PropIsQualifier);
+  EXPECT_EQ(Get(meta, kTestNS, "Plain"), "p");
+  meta.DeleteQualifier(kTestNS, "Plain", kTestNS, "Unit");
+  EXPECT_FALSE(meta.DoesQualifierExist(kTestNS, "Plain", kTestNS, "Unit"));
+  EXPECT_THROW(meta.SetQualifier(kTestNS, "Missing", kTestNS, "Unit", "mm"), XMP_Error);
+}
+
+TEST_F(XMPProperties, LocalizedTextFollowsXDefaultRules) {
+  XMPMeta meta;
+  std::string lang, value;
+  EXPECT_FALSE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "x-default", &lang, &value));
+  meta.SetLocalizedText(kXMP_NS_DC, "rights", "", "x-default", "All rights reserved");
+  meta.SetLocalizedText(kXMP_NS_DC, "rights", "de", "de-DE", "Alle Rechte vorbehalten");
+  meta.SetLocalizedText(kXMP_NS_DC, "rights", "fr", "fr-FR", "Tous droits réservés");
+  XMP_OptionBits form = 0;
+  meta.GetProperty(kXMP_NS_DC, "rights", nullptr, &form);
+  EXPECT_TRUE(form & kXMP_PropArrayIsAltText);
+  // Specific match, generic match, then x-default.
+  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "de", "de-DE", &lang, &value));
+  EXPECT_EQ(lang, "de-DE");
+  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "fr", "fr-CA", &lang, &value));
+  EXPECT_EQ(value, "Tous droits réservés");
+  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "it-IT", &lang, &value));
+  EXPECT_EQ(lang, "x-default");
+  std::string selector;
+  XMPUtils::ComposeLangSelector(kXMP_NS_DC, "rights", "DE-de", &selector);
+  EXPECT_EQ(Get(meta, kXMP_NS_DC, selector), "Alle Rechte vorbehalten");
+  meta.DeleteLocalizedText(kXMP_NS_DC, "rights", "fr", "fr-FR");
+  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "fr-FR", &lang, &value));
+  EXPECT_EQ(lang, "x-default");
+  meta.AppendArrayItem(kTestNS, "Seq", kXMP_PropArrayIsOrdered, "x");
+  EXPECT_THROW(meta.GetLocalizedText(kTestNS, "Seq", "", "x-default", &lang, &value), XMP_Error);
+}
+
+TEST_F(XMPProperties, CloneIsDeepAndEraseKeepsTheHandle) {
+  XMPMeta meta = xmptest::Parse(xmptest::RealWorldPacket());
+  meta.SetMultiValued(kXMP_NS_XMP, "Rating");
+  XMPMeta copy = meta.Clone();
+  EXPECT_NE(copy.GetInternalRef(), meta.GetInternalRef());
+  copy.SetProperty(kXMP_NS_XMP, "Label", "Changed");
+  EXPECT_EQ(Get(meta, kXMP_NS_XMP, "Label"), "Select");
+  EXPECT_TRUE(copy.IsMultiValued(kXMP_NS_XMP, "Rating"));
+  const XMPMetaRef before = meta.GetInternalRef();
+  meta.Erase();
+  EXPECT_EQ(meta.GetInternalRef(), before);
+  EXPECT_FALSE(meta.DoesPropertyExist(kXMP_NS_XMP, "Rating"));
+  EXPECT_FALSE(meta.IsMultiValued(kXMP_NS_XMP, "Rating"));
+  EXPECT_EQ(Get(copy, kXMP_NS_XMP, "Rating"), "4");
+}
+
+TEST_F(XMPProperties, TransientNamespaceIsNeverSerialised) {
+  XMPMeta meta;
+  meta.SetProperty(kXMP_NS_XMP, "Label", "kept");
+  meta.SetProperty(kXMP_NS_Transient, "MultiFileCount", "3");
+  const std::string text = xmptest::Serialize(meta);
+  EXPECT_EQ(text.find("transient"), std::string::npos) << text;
+  EXPECT_EQ(text.find("MultiFileCount"), std::string::npos);
+  EXPECT_NE(text.find("kept"), std::string::npos);
+  EXPECT_EQ(Get(meta, kXMP_NS_Transient, "MultiFileCount"), "3");  // still in memory
+}
+
+TEST_F(XMPProperties, MultiValueMarksCoverDescendantsAndClearBelow) {
+  XMPMeta meta;
+  EXPECT_FALSE(meta.IsMultiValued(kTestNS, "Place"));
+  meta.SetMultiValued(kTestNS, "ovt:Place");
+  meta.SetMultiValued(kTestNS, "List[2]");
+  meta.SetMultiValued(kTestNS, "Placement");
+  EXPECT_TRUE(meta.IsMultiValued(kTestNS, "Place"));
+  EXPECT_TRUE(meta.IsMultiValued(kTestNS, "Place/ovt:Code"));
+  EXPECT_TRUE(meta.IsMultiValued(kTestNS, "Place/ovt:Inner/dc:title[1]"));
+  EXPECT_TRUE(meta.IsMultiValued(kTestNS, "List[2]/?ovt:Q"));
+  EXPECT_FALSE(meta.IsMultiValued(kTestNS, "List[1]"));
+  EXPECT_FALSE(meta.IsMultiValued(kTestNS, "List"));
+  EXPECT_FALSE(meta.IsMultiValued(kXMP_NS_DC, "Place"));
+  meta.ClearMultiValueInfo(kTestNS, "Place");
+  EXPECT_FALSE(meta.IsMultiValued(kTestNS, "Place/ovt:Code"));
+  EXPECT_TRUE(meta.IsMultiValued(kTestNS, "Placement"));  // a sibling sharing the prefix stays
+  meta.ClearMultiValueInfo(kTestNS, "List");
+  EXPECT_FALSE(meta.IsMultiValued(kTestNS, "List[2]"));
+  meta.ClearMultiValueInfo(kTestNS, "");
+  EXPECT_FALSE(meta.IsMultiValued(kTestNS, "Placement"));
+}
+
+TEST_F(XMPProperties, OrdinaryOperationsPrintNothingOnStderr) {
+  testing::internal::CaptureStderr();
+  {
+    XMPMeta meta = xmptest::Parse(xmptest::RealWorldPacket());
+    std::string value, lang;
+    meta.GetProperty(kXMP_NS_XMP, "Missing", &value);
+    meta.GetProperty("http://ovra.test/unregistered/", "X", &value);
+    meta.DoesPropertyExist("http://ovra.test/unregistered/", "X");
+    meta.DeleteProperty("http://ovra.test/unregistered/", "X");
+    meta.DeleteProperty(kXMP_NS_XMP, "Missing");
+    meta.GetArrayItem(kXMP_NS_DC, "missing", 1, &value);
+    meta.GetArrayItem(kXMP_NS_DC, "creator", 9, &value);
+    meta.CountArrayItems(kXMP_NS_DC, "subject");
+    meta.GetStructField(kXMP_NS_XMP_MM, "Missing", kXMP_NS_XMP_ResourceRef, "documentID", &value);
+    meta.GetStructField(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "missing", &value);
+    meta.GetQualifier(kXMP_NS_XMP, "Missing", kXMP_NS_XMP, "Q", &value);
+    meta.GetLocalizedText(kXMP_NS_DC, "missing", "", "x-default", &lang, &value);
+    meta.GetLocalizedText(kXMP_NS_DC, "title", "", "it-IT", &lang, &value);
+    meta.SetProperty(kXMP_NS_XMP, "Label", "New");
+    meta.SetLocalizedText(kXMP_NS_DC, "title", "", "x-default", "T");
+    meta.AppendArrayItem(kXMP_NS_DC, "subject", 0, "more");
+    meta.DeleteArrayItem(kXMP_NS_DC, "subject", 1);
+    meta.DeleteArrayItem(kXMP_NS_DC, "missing", 1);
+    meta.DeleteStructField(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "documentID");
+    meta.DeleteStructField(kXMP_NS_XMP, "Label", kXMP_NS_XMP, "X");
+    meta.DeleteLocalizedText(kXMP_NS_DC, "title", "", "it-IT");
+    meta.DeleteQualifier(kXMP_NS_XMP, "Missing", kXMP_NS_XMP, "Q");
+    XMPIterator all(meta);
+    while (all.Next(&value, &lang)) {
+    }
+    XMPIterator none(meta, "http://ovra.test/unregistered/");
+    none.Next();
+    XMPIterator missing(meta, kXMP_NS_DC, "missing");
+    missing.Next();
+    std::string text;
+    meta.SerializeToBuffer(&text);
+    meta.IsMultiValued(kXMP_NS_DC, "title");
+  }
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+}
