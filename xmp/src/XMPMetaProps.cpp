@@ -40,6 +40,14 @@ void RequireArray(XmpPtr xmp, const std::string& ns, const std::string& arrayNam
   if (form) *form = options;
 }
 
+// The implied form bits: alt-text is an alternative is ordered is an array.
+XMP_OptionBits WithImpliedBits(XMP_OptionBits options) {
+  if (options & kXMP_PropArrayIsAltText) options |= kXMP_PropArrayIsAlternate;
+  if (options & kXMP_PropArrayIsAlternate) options |= kXMP_PropArrayIsOrdered;
+  if (options & kXMP_PropArrayIsOrdered) options |= kXMP_PropValueIsArray;
+  return options;
+}
+
 void CheckIndex(XMP_Index index) {
   if (index == 0 || index < kXMP_ArrayLastItem) detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(index));
 }
@@ -174,7 +182,8 @@ void XMPMeta::SetProperty(const std::string& ns, const std::string& name, const 
                           XMP_OptionBits options) {
   XmpPtr xmp = X(mRef);
   detail::RequirePrefix(ns);
-  if (!xmp_set_property(xmp, ns.c_str(), name.c_str(), value.c_str(), options)) Fail("writing", ns, name);
+  if (!xmp_set_property(xmp, ns.c_str(), name.c_str(), value.c_str(), WithImpliedBits(options)))
+    Fail("writing", ns, name);
 }
 
 void XMPMeta::DeleteProperty(const std::string& ns, const std::string& name) {
@@ -306,7 +315,7 @@ void XMPMeta::SetArrayItem(const std::string& ns, const std::string& arrayName, 
   const XMP_Index position = index == kXMP_ArrayLastItem ? count : index;
   if (position < 1 || position > count + 1 || (position == count + 1 && (options & kXMP_InsertAfterItem)))
     detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(index));
-  if (!xmp_set_array_item(xmp, ns.c_str(), arrayName.c_str(), position, value.c_str(), options))
+  if (!xmp_set_array_item(xmp, ns.c_str(), arrayName.c_str(), position, value.c_str(), WithImpliedBits(options)))
     Fail("writing an item of", ns, arrayName);
 }
 
@@ -314,6 +323,8 @@ void XMPMeta::AppendArrayItem(const std::string& ns, const std::string& arrayNam
                               const std::string& value, XMP_OptionBits options) {
   XmpPtr xmp = X(mRef);
   detail::RequirePrefix(ns);
+  arrayOptions = WithImpliedBits(arrayOptions);
+  options = WithImpliedBits(options);
   bool exists = false;
   RequireArray(xmp, ns, arrayName, &exists);
   if (!exists && !(arrayOptions & kXMP_PropArrayFormMask))
