@@ -1,0 +1,84 @@
+#include <cstdlib>
+#include <filesystem>
+
+#include <ovracore/FileSupport.h>
+
+#include "SrcTestSupport.h"
+#include "TestSupport.h"
+
+using namespace ovrametadata;
+namespace fs = std::filesystem;
+
+namespace {
+
+std::u16string Expected(const char* rootVariable, const std::string& relative) {
+  return ovratest::U16((fs::path(std::getenv(rootVariable)) / relative).lexically_normal().string());
+}
+
+// Sets an environment variable for the lifetime of the object.
+class ScopedEnv {
+ public:
+  ScopedEnv(const char* name, const char* value) : mName(name) {
+    if (const char* old = std::getenv(name)) mOld = old;
+    setenv(name, value, 1);
+  }
+  ~ScopedEnv() { setenv(mName, mOld.c_str(), 1); }
+
+ private:
+  const char* mName;
+  std::string mOld;
+};
+
+TEST(Folders, CustomDefinitionFoldersDifferOnlyInTheRoot) {
+  const std::string relative = "Orlex/XMP/Custom Propsheet Panels/4.0/custom";
+  EXPECT_EQ(CustomDefinitionsUserDirectory(), Expected("OVRAMETADATA_USER_ROOT", relative));
+  EXPECT_EQ(CustomDefinitionsGlobalDirectory(), Expected("OVRAMETADATA_LOCAL_ROOT", relative));
+  EXPECT_NE(CustomDefinitionsUserDirectory(), CustomDefinitionsGlobalDirectory());
+  // Asking creates nothing.
+  EXPECT_FALSE(fs::exists(ovratest::U8(CustomDefinitionsUserDirectory())));
+  EXPECT_FALSE(fs::exists(ovratest::U8(PanelsDefinitionsGlobalDirectory(kPanelsVersion4))));
+}
+
+TEST(Folders, PanelFoldersFollowTheLayoutVersion) {
+  const std::string base = "Orlex/XMP/Custom Propsheet Panels/";
+  EXPECT_EQ(PanelsDefinitionsUserDirectory(kPanelsVersion4),
+            Expected("OVRAMETADATA_USER_ROOT", base + "4.0/panels"));
+  EXPECT_EQ(PanelsDefinitionsUserDirectory(kPanelsVersion3),
+            Expected("OVRAMETADATA_USER_ROOT", base + "3.0/panels"));
+  EXPECT_EQ(PanelsDefinitionsUserDirectory(kPanelsVersion2),
+            Expected("OVRAMETADATA_USER_ROOT", base + "2.0/panels"));
+  EXPECT_EQ(PanelsDefinitionsUserDirectory(static_cast<VelkVersion>(7)),
+            Expected("OVRAMETADATA_USER_ROOT", base + "2.0/panels"));
+  EXPECT_EQ(PanelsDefinitionsGlobalDirectory(kPanelsVersion3),
+            Expected("OVRAMETADATA_LOCAL_ROOT", base + "3.0/panels"));
+}
+
+TEST(Folders, UnusableRootGivesEmptyPaths) {
+  ScopedEnv noUserRoot("OVRAMETADATA_USER_ROOT", "");
+  EXPECT_TRUE(CustomDefinitionsUserDirectory().empty());
+  EXPECT_TRUE(PanelsDefinitionsUserDirectory(kPanelsVersion4).empty());
+  EXPECT_FALSE(CustomDefinitionsGlobalDirectory().empty());
+}
+
+TEST(Folders, XMPFilesPluginsLieBelowTheApplicationPluginFolder) {
+  ovratest::TempDir plugins;
+  ovracore::filesupport::SetPluginsFolder(ovratest::U16(plugins.path().string()));
+  EXPECT_EQ(XMPFilesPluginsDirectory(),
+            ovratest::U16((plugins.path() / "XMPFiles").lexically_normal().string()));
+  // Back to the default folder beside the library.
+  ovracore::filesupport::SetPluginsFolder(u"");
+  EXPECT_EQ(fs::path(ovratest::U8(XMPFilesPluginsDirectory())).filename(), "XMPFiles");
+  EXPECT_NE(XMPFilesPluginsDirectory(),
+            ovratest::U16((plugins.path() / "XMPFiles").lexically_normal().string()));
+}
+
+TEST(Folders, OnlyDICOMAndMobileAreExcludedFromTheGlobalFolder) {
+  EXPECT_TRUE(IsSchemaExcludedFromGlobal(u"DICOM.xml"));
+  EXPECT_TRUE(IsSchemaExcludedFromGlobal(u"Mobile.xml"));
+  EXPECT_FALSE(IsSchemaExcludedFromGlobal(u"dicom.xml"));
+  EXPECT_FALSE(IsSchemaExcludedFromGlobal(u"Mobile.XML"));
+  EXPECT_FALSE(IsSchemaExcludedFromGlobal(u"DICOM"));
+  EXPECT_FALSE(IsSchemaExcludedFromGlobal(u"Other.xml"));
+}
+
+}  // namespace
