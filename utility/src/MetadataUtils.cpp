@@ -50,15 +50,25 @@ FormatCache& XMPFormatCache() {
   return *cache;
 }
 
-// The modification time in milliseconds, or not-a-date-time when the file
-// cannot be examined.
-boost::posix_time::ptime ModificationTime(const UTF16String& path) {
+// Whether the path names a regular file (following links), and its
+// modification time in milliseconds (not-a-date-time when it is not one).
+// One stat call answers both: the cached lookup is dominated by it.
+struct FileStatus {
+  bool exists = false;
+  boost::posix_time::ptime modified{boost::posix_time::not_a_date_time};
+};
+
+FileStatus ExamineFile(const UTF16String& path) {
+  FileStatus result;
   struct stat status {};
-  if (::stat(ovracore::filesupport::ToFSPath(path).c_str(), &status) != 0) {
-    return boost::posix_time::ptime(boost::posix_time::not_a_date_time);
+  if (::stat(ovracore::filesupport::ToFSPath(path).c_str(), &status) != 0 ||
+      !S_ISREG(status.st_mode)) {
+    return result;
   }
-  return boost::posix_time::from_time_t(status.st_mtim.tv_sec) +
-         boost::posix_time::milliseconds(status.st_mtim.tv_nsec / 1000000);
+  result.exists = true;
+  result.modified = boost::posix_time::from_time_t(status.st_mtim.tv_sec) +
+                    boost::posix_time::milliseconds(status.st_mtim.tv_nsec / 1000000);
+  return result;
 }
 
 XMP_FileFormat DetectFormat(const UTF16String& path) {
@@ -82,8 +92,9 @@ XMP_FileFormat DetectFormat(const UTF16String& path) {
 }  // namespace
 
 XMP_FileFormat GetXMPFormat(const UTF16String& path) {
-  if (!ovracore::filesupport::File(path).Exists()) return kUnknownFormat;
-  const boost::posix_time::ptime modified = ModificationTime(path);
+  const FileStatus file = ExamineFile(path);
+  if (!file.exists) return kUnknownFormat;
+  const boost::posix_time::ptime& modified = file.modified;
   {
     ovracore::LockGuard<ovracore::RecursiveMutex> lock(sXMPFormatCacheCriticalSection);
     FormatCache& cache = XMPFormatCache();
@@ -103,9 +114,7 @@ XMP_FileFormat GetXMPFormat(const UTF16String& path) {
 void AddCachedXMPFormat(const UTF16String& path, XMP_FileFormat format,
                         const boost::posix_time::ptime& modified) {
   boost::posix_time::ptime time = modified;
-  if (time.is_not_a_date_time() && ovracore::filesupport::File(path).Exists()) {
-    time = ModificationTime(path);
-  }
+  if (time.is_not_a_date_time()) time = ExamineFile(path).modified;
   if (time.is_special()) return;
   ovracore::LockGuard<ovracore::RecursiveMutex> lock(sXMPFormatCacheCriticalSection);
   XMPFormatCache().emplace(path, FormatCacheInfo{format, time});
