@@ -1,0 +1,385 @@
+// End-to-end tests of the ovrameta tool: the built program runs on copies of
+// the bundled samples in temporary folders, and ExifTool checks what it wrote.
+#include <sys/stat.h>
+#include <sys/wait.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include "../providers/MediaFiles.h"
+#include "TestSupport.h"
+
+#ifndef OVRAMETA_EXE
+#error "OVRAMETA_EXE must name the built ovrameta program"
+#endif
+#ifndef OVRA_SAMPLES_DIR
+#error "OVRA_SAMPLES_DIR must name the samples folder"
+#endif
+
+namespace {
+
+namespace fs = std::filesystem;
+using ovratest::ReadFile;
+using ovratest::TempDir;
+using ovratest::WriteFile;
+using ovratest::media::ExifToolValue;
+using ovratest::media::HaveExifTool;
+using ovratest::media::RunCommand;
+
+struct Result {
+  int status = -1;
+  std::string out;
+  std::string err;
+};
+
+std::string Quote(const std::string& text) {
+  std::string quoted = "'";
+  for (char c : text) {
+    if (c == '\'') {
+      quoted += "'\\''";
+    } else {
+      quoted += c;
+    }
+  }
+  return quoted + "'";
+}
+
+class OvrametaTest : public ::testing::Test {
+ protected:
+  // A private copy of a sample, under a new name when asked.
+  fs::path Sample(const std::string& name, const std::string& copyName = std::string()) {
+    const fs::path target = mDir / (copyName.empty() ? name : copyName);
+    fs::copy_file(fs::path(OVRA_SAMPLES_DIR) / name, target, fs::copy_options::overwrite_existing);
+    return target;
+  }
+
+  // Runs ovrameta in the temporary folder with the given arguments.
+  Result Run(const std::vector<std::string>& arguments) {
+    std::string command = "cd " + Quote(mDir.path().string()) + " && " + Quote(OVRAMETA_EXE);
+    for (const auto& argument : arguments) command += " " + Quote(argument);
+    const fs::path out = mDir / ".out";
+    const fs::path err = mDir / ".err";
+    command += " >" + Quote(out.string()) + " 2>" + Quote(err.string()) + " </dev/null";
+    const int raw = std::system(command.c_str());
+    Result result;
+    result.status = WIFEXITED(raw) ? WEXITSTATUS(raw) : -1;
+    result.out = ReadFile(out);
+    result.err = ReadFile(err);
+    fs::remove(out);
+    fs::remove(err);
+    return result;
+  }
+
+  // The display value of one property of one file; empty when absent.
+  std::string Get(const fs::path& file, const std::string& name) {
+    Result result = Run({"get", file.filename().string(), name});
+    while (!result.out.empty() && result.out.back() == '\n') result.out.pop_back();
+    return result.status == 0 ? result.out : std::string();
+  }
+
+  TempDir mDir;
+};
+
+#define EXPECT_CONTAINS(haystack, needle) \
+  EXPECT_NE((haystack).find(needle), std::string::npos) << "missing: " << (needle) << "\nin:\n" << (haystack)
+
+// ---------------------------------------------------------------------------
+// show
+
+TEST_F(OvrametaTest, ShowPhotoListsCameraGpsAndIptcValuesUnderSchemaLabels) {
+  Sample("harbour.jpg");
+  const Result result = Run({"show", "harbour.jpg"});
+  ASSERT_EQ(result.status, 0) << result.err;
+  EXPECT_CONTAINS(result.out, "Dublin Core\n");
+  EXPECT_CONTAINS(result.out, "  Title: Harbour at dawn\n");
+  // Arrays as their items, structures indented by field.
+  EXPECT_CONTAINS(result.out, "  Keywords:\n    - harbour\n    - dawn\n    - boats\n");
+  EXPECT_CONTAINS(result.out, "  Flash:\n    Fired: Did not fire\n");
+  EXPECT_CONTAINS(result.out, "  Make: Orlex\n");
+  EXPECT_CONTAINS(result.out, "  GPS Latitude: 37\xC2\xB0 46' 30");
+  EXPECT_CONTAINS(result.out, "  Country Code: US\n");
+  EXPECT_CONTAINS(result.out, "  Creator Contact Info:\n    City: San Francisco\n");
+  // Closed choices show the label of the stored value.
+  EXPECT_CONTAINS(result.out, "  Rating: Four Stars\n");
+  // A schema without values is not shown.
+  EXPECT_EQ(result.out.find("XMP Dynamic Media"), std::string::npos);
+}
+
+TEST_F(OvrametaTest, ShowClipAndRecordingListDynamicMediaValues) {
+  Sample("interview.mp4");
+  Sample("ambience.wav");
+  const Result clip = Run({"show", "interview.mp4"});
+  ASSERT_EQ(clip.status, 0) << clip.err;
+  EXPECT_CONTAINS(clip.out, "XMP Dynamic Media\n");
+  EXPECT_CONTAINS(clip.out, "  Scene: 12\n");
+  EXPECT_CONTAINS(clip.out, "  Duration:\n    Value: 12000\n");
+  EXPECT_CONTAINS(clip.out, "  Markers:\n    [1]\n");
+  EXPECT_CONTAINS(clip.out, "      Comment: Boat enters\n");
+
+  const Result recording = Run({"show", "ambience.wav"});
+  ASSERT_EQ(recording.status, 0) << recording.err;
+  EXPECT_CONTAINS(recording.out, "  Album: Harbour sounds\n");
+  EXPECT_CONTAINS(recording.out, "  Title: Harbour ambience\n");
+}
+
+TEST_F(OvrametaTest, ShowOfSeveralFilesMarksDifferingValuesAsMixed) {
+  Sample("harbour.jpg", "a.jpg");
+  Sample("harbour.jpg", "b.jpg");
+  ASSERT_EQ(Run({"set", "b.jpg", "xmp:Rating=1"}).status, 0);
+  const Result result = Run({"show", "a.jpg", "b.jpg"});
+  ASSERT_EQ(result.status, 0) << result.err;
+  EXPECT_CONTAINS(result.out, "  Rating: (mixed)\n");
+  EXPECT_CONTAINS(result.out, "  Title: Harbour at dawn\n");
+
+  const Result each = Run({"show", "--each", "a.jpg", "b.jpg"});
+  ASSERT_EQ(each.status, 0) << each.err;
+  EXPECT_CONTAINS(each.out, "== a.jpg ==\n");
+  EXPECT_CONTAINS(each.out, "  Rating: One Star\n");
+  EXPECT_EQ(each.out.find("(mixed)"), std::string::npos);
+}
+
+// ---------------------------------------------------------------------------
+// get
+
+TEST_F(OvrametaTest, GetGivesDisplayValuesRawTextAndFieldsOfStructures) {
+  Sample("harbour.jpg");
+  Sample("interview.mp4");
+  EXPECT_EQ(Get("harbour.jpg", "dc:title"), "Harbour at dawn");
+  EXPECT_EQ(Get("harbour.jpg", "xmp:Rating"), "Four Stars");
+  EXPECT_EQ(Get("harbour.jpg", "dc:subject"), "harbour; dawn; boats");
+  EXPECT_EQ(Get("harbour.jpg", "exif:Flash/exif:Fired"), "Did not fire");
+  EXPECT_EQ(Get("interview.mp4", "xmpDM:markers[2]/xmpDM:name"), "Action");
+
+  const Result raw = Run({"get", "--raw", "harbour.jpg", "xmp:Rating", "exif:Flash/exif:Fired"});
+  ASSERT_EQ(raw.status, 0) << raw.err;
+  EXPECT_EQ(raw.out, "xmp:Rating = 4\nexif:Flash/exif:Fired = False\n");
+
+  const Result structure = Run({"get", "interview.mp4", "xmpDM:startTimecode"});
+  ASSERT_EQ(structure.status, 0) << structure.err;
+  EXPECT_CONTAINS(structure.out, "xmpDM:startTimecode/xmpDM:timeValue = 01:00:00:00\n");
+}
+
+TEST_F(OvrametaTest, GetOfAnAbsentValueExitsWithOneAndNamesFileAndProperty) {
+  Sample("harbour.jpg");
+  Sample("interview.mp4");
+  const Result result = Run({"get", "harbour.jpg", "interview.mp4", "xmpDM:scene"});
+  EXPECT_EQ(result.status, 1);
+  EXPECT_EQ(result.out, "interview.mp4: xmpDM:scene = 12\n");
+  EXPECT_CONTAINS(result.err, "harbour.jpg: xmpDM:scene: no value");
+}
+
+TEST_F(OvrametaTest, GetJsonGivesEveryPropertyWithItsType) {
+  Sample("interview.mp4");
+  const Result result = Run({"get", "--json", "interview.mp4"});
+  ASSERT_EQ(result.status, 0) << result.err;
+  const auto json = nlohmann::json::parse(result.out);
+  ASSERT_EQ(json.size(), 1u);
+  EXPECT_EQ(json[0]["file"], "interview.mp4");
+  const auto& properties = json[0]["properties"];
+  auto find = [&](const std::string& name) {
+    for (const auto& property : properties) {
+      if (property["name"] == name) return property;
+    }
+    return nlohmann::json();
+  };
+  const auto good = find("xmpDM:good");
+  ASSERT_FALSE(good.is_null()) << result.out;
+  EXPECT_EQ(good["type"], "boolean");
+  EXPECT_EQ(good["raw"], "True");
+  const auto markers = find("xmpDM:markers");
+  ASSERT_FALSE(markers.is_null());
+  EXPECT_EQ(markers["type"], "seq of Marker (structure)");
+  ASSERT_EQ(markers["items"].size(), 2u);
+  EXPECT_EQ(markers["items"][1]["fields"][0]["name"], "xmpDM:markers[2]/xmpDM:comment");
+
+  const Result named = Run({"get", "--json", "interview.mp4", "xmpDM:scene", "xmpDM:album"});
+  EXPECT_EQ(named.status, 1);
+  const auto namedJson = nlohmann::json::parse(named.out);
+  EXPECT_EQ(namedJson[0]["properties"][0]["value"], "12");
+  EXPECT_TRUE(namedJson[0]["properties"][1]["value"].is_null());
+}
+
+// ---------------------------------------------------------------------------
+// set and delete
+
+TEST_F(OvrametaTest, SetAndDeleteRoundTripOnEverySampleKind) {
+  for (const std::string name : {"harbour.jpg", "interview.mp4", "ambience.wav"}) {
+    SCOPED_TRACE(name);
+    Sample(name);
+    const Result set = Run({"set", name, "dc:title=Edited " + name, "xmpDM:scene=42",
+                            "dc:subject=one; two", "--delete", "xmp:Rating"});
+    ASSERT_EQ(set.status, 0) << set.err;
+    EXPECT_EQ(Get(name, "dc:title"), "Edited " + name);
+    EXPECT_EQ(Get(name, "xmpDM:scene"), "42");
+    EXPECT_EQ(Get(name, "dc:subject"), "one; two");
+    const Result rating = Run({"get", name, "xmp:Rating"});
+    EXPECT_EQ(rating.status, 1);
+    // Deleting what is already gone is an absent value.
+    EXPECT_EQ(Run({"set", name, "--delete", "xmp:Rating"}).status, 1);
+  }
+  // Values the edit did not name are kept.
+  EXPECT_EQ(Get("interview.mp4", "xmpDM:markers[1]/xmpDM:name"), "Slate");
+  EXPECT_EQ(Get("ambience.wav", "xmpDM:album"), "Harbour sounds");
+}
+
+TEST_F(OvrametaTest, SetOnAFileWithoutMetadataCreatesIt) {
+  WriteFile(mDir / "bare.jpg", ovratest::media::MinimalJPEG());
+  EXPECT_EQ(Run({"get", "bare.jpg", "dc:title"}).status, 1);
+  ASSERT_EQ(Run({"set", "bare.jpg", "dc:title=First words"}).status, 0);
+  EXPECT_EQ(Get("bare.jpg", "dc:title"), "First words");
+}
+
+TEST_F(OvrametaTest, AggregateEditReachesEveryFileAndKeepsDifferingValues) {
+  const std::vector<std::string> files = {"a.jpg", "b.jpg", "c.jpg"};
+  for (std::size_t i = 0; i < files.size(); ++i) {
+    Sample("harbour.jpg", files[i]);
+    ASSERT_EQ(Run({"set", files[i], "dc:title=Frame " + std::to_string(i + 1)}).status, 0);
+  }
+  const Result result = Run({"set", "a.jpg", "b.jpg", "c.jpg", "xmp:Label=Final",
+                             "photoshop:City=Oakland", "--delete", "xmp:Rating"});
+  ASSERT_EQ(result.status, 0) << result.err;
+  for (std::size_t i = 0; i < files.size(); ++i) {
+    SCOPED_TRACE(files[i]);
+    EXPECT_EQ(Get(files[i], "xmp:Label"), "Final");
+    EXPECT_EQ(Get(files[i], "photoshop:City"), "Oakland");
+    EXPECT_EQ(Get(files[i], "dc:title"), "Frame " + std::to_string(i + 1));
+    EXPECT_EQ(Run({"get", files[i], "xmp:Rating"}).status, 1);
+  }
+}
+
+TEST_F(OvrametaTest, RefusedValuesLeaveEveryFileUntouched) {
+  Sample("harbour.jpg");
+  Sample("interview.mp4");
+  const std::string photoBefore = ReadFile(mDir / "harbour.jpg");
+  const std::string clipBefore = ReadFile(mDir / "interview.mp4");
+  struct Case {
+    std::string assignment;
+    std::string reason;
+  };
+  const std::vector<Case> cases = {
+      {"exif:ExposureProgram=42", "is not one of the allowed values"},  // closed choice
+      {"xmpDM:audioSampleRate=fast", "is not an integer"},
+      {"xmpDM:good=yes", "is not a boolean"},
+      {"xmpDM:duration=12", "structure"},
+      {"xmp:CreateDate=yesterday", "is not a date"},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.assignment);
+    // A valid assignment beside the refused one is not written either.
+    const Result result = Run({"set", "harbour.jpg", "interview.mp4", "dc:title=Changed", c.assignment});
+    EXPECT_EQ(result.status, 2);
+    const std::string name = c.assignment.substr(0, c.assignment.find('='));
+    EXPECT_CONTAINS(result.err, "harbour.jpg, interview.mp4: " + name + ": refused: ");
+    EXPECT_CONTAINS(result.err, c.reason);
+  }
+  EXPECT_EQ(ReadFile(mDir / "harbour.jpg"), photoBefore);
+  EXPECT_EQ(ReadFile(mDir / "interview.mp4"), clipBefore);
+}
+
+TEST_F(OvrametaTest, NormalisesAcceptedValuesToTheirStoredForm) {
+  Sample("interview.mp4");
+  ASSERT_EQ(Run({"set", "interview.mp4", "xmpDM:good=false", "xmpDM:audioSampleRate=+044100"}).status,
+            0);
+  const Result raw = Run({"get", "--raw", "interview.mp4", "xmpDM:good", "xmpDM:audioSampleRate"});
+  EXPECT_EQ(raw.out, "xmpDM:good = False\nxmpDM:audioSampleRate = 44100\n");
+}
+
+// ---------------------------------------------------------------------------
+// Files and usage
+
+TEST_F(OvrametaTest, UnreadableFilesExitWithTwoAndTheOthersAreStillRead) {
+  Sample("harbour.jpg");
+  WriteFile(mDir / "notes.txt", "not a media file\n");
+  const Result result = Run({"get", "missing.jpg", "notes.txt", "harbour.jpg", "dc:title"});
+  EXPECT_EQ(result.status, 2);
+  EXPECT_CONTAINS(result.err, "missing.jpg: cannot read file");
+  EXPECT_CONTAINS(result.err, "notes.txt: cannot read file");
+  EXPECT_EQ(result.out, "harbour.jpg: dc:title = Harbour at dawn\n");
+
+  if (geteuid() != 0) {
+    fs::permissions(mDir / "harbour.jpg", fs::perms::none);
+    const Result locked = Run({"show", "harbour.jpg"});
+    EXPECT_EQ(locked.status, 2);
+    EXPECT_CONTAINS(locked.err, "harbour.jpg: cannot read file");
+    fs::permissions(mDir / "harbour.jpg", fs::perms::owner_all);
+  }
+  // A file that cannot be read makes set write nothing at all.
+  const std::string before = ReadFile(mDir / "harbour.jpg");
+  EXPECT_EQ(Run({"set", "harbour.jpg", "missing.jpg", "dc:title=x"}).status, 2);
+  EXPECT_EQ(ReadFile(mDir / "harbour.jpg"), before);
+}
+
+TEST_F(OvrametaTest, UsageErrorsExitWithTwo) {
+  Sample("harbour.jpg");
+  const Result unknownPrefix = Run({"get", "harbour.jpg", "nope:title"});
+  EXPECT_EQ(unknownPrefix.status, 2);
+  EXPECT_CONTAINS(unknownPrefix.err, "\"nope:title\": no schema is registered with the prefix \"nope\"");
+  const Result unknownProperty = Run({"get", "harbour.jpg", "dc:titel"});
+  EXPECT_EQ(unknownProperty.status, 2);
+  EXPECT_CONTAINS(unknownProperty.err, "has no property \"titel\"");
+  EXPECT_EQ(Run({"get", "harbour.jpg"}).status, 2);
+  EXPECT_EQ(Run({"set", "harbour.jpg"}).status, 2);
+  EXPECT_EQ(Run({"frobnicate"}).status, 2);
+  EXPECT_EQ(Run({"--help"}).status, 0);
+}
+
+TEST_F(OvrametaTest, SchemasListsPropertiesWithTypesAndStructureFields) {
+  const Result all = Run({"schemas"});
+  ASSERT_EQ(all.status, 0) << all.err;
+  EXPECT_CONTAINS(all.out, "dc  http://purl.org/dc/elements/1.1/  Dublin Core\n");
+  const Result dm = Run({"schemas", "xmpDM"});
+  ASSERT_EQ(dm.status, 0) << dm.err;
+  EXPECT_EQ(dm.out.find("Dublin Core"), std::string::npos);
+  EXPECT_CONTAINS(dm.out, "xmpDM:markers");
+  EXPECT_CONTAINS(dm.out, "seq of Marker (structure)");
+  EXPECT_CONTAINS(dm.out, "xmpDM:good");
+  EXPECT_EQ(Run({"schemas", "nope"}).status, 2);
+}
+
+// ---------------------------------------------------------------------------
+// Interoperability with ExifTool
+
+TEST_F(OvrametaTest, ExifToolReadsWhatOvrametaWrote) {
+  if (!HaveExifTool()) GTEST_SKIP() << "ExifTool is missing; interoperability not checked";
+  const fs::path photo = Sample("harbour.jpg");
+  const fs::path clip = Sample("interview.mp4");
+  ASSERT_EQ(Run({"set", "harbour.jpg", "dc:title=Written by ovrameta", "xmp:Rating=2",
+                 "dc:subject=north; south"}).status,
+            0);
+  ASSERT_EQ(Run({"set", "interview.mp4", "xmpDM:scene=7", "xmpDM:good=False"}).status, 0);
+  EXPECT_EQ(ExifToolValue(photo, "XMP-dc:Title"), "Written by ovrameta");
+  EXPECT_EQ(ExifToolValue(photo, "XMP-xmp:Rating"), "2");
+  EXPECT_EQ(ExifToolValue(photo, "XMP-dc:Subject"), "north, south");
+  // The camera data stays, in its native EXIF form, and the legacy IPTC
+  // title follows the XMP one.
+  EXPECT_EQ(ExifToolValue(photo, "EXIF:ExposureTime"), "1/250");
+  EXPECT_EQ(ExifToolValue(photo, "IPTC:ObjectName"), "Written by ovrameta");
+  EXPECT_EQ(ExifToolValue(clip, "XMP-xmpDM:Scene"), "7");
+  EXPECT_EQ(ExifToolValue(clip, "XMP-xmpDM:Good"), "False");
+  EXPECT_EQ(ExifToolValue(clip, "XMP-xmpDM:ShotName"), "Pier wide");
+}
+
+TEST_F(OvrametaTest, OvrametaReadsWhatExifToolWrote) {
+  if (!HaveExifTool()) GTEST_SKIP() << "ExifTool is missing; interoperability not checked";
+  const fs::path photo = Sample("harbour.jpg");
+  const fs::path clip = Sample("interview.mp4");
+  RunCommand("LC_ALL=C exiftool -q -overwrite_original '-XMP-dc:Title=Written by ExifTool' "
+             "-XMP-xmp:Rating=5 '-XMP-dc:Subject+=east' -XMP-iptcCore:CountryCode=CA " +
+             Quote(photo.string()));
+  RunCommand("LC_ALL=C exiftool -q -overwrite_original -XMP-xmpDM:TakeNumber=9 "
+             "'-XMP-xmpDM:Markers+={Name=Wrap,StartTime=90}' " +
+             Quote(clip.string()));
+  EXPECT_EQ(Get("harbour.jpg", "dc:title"), "Written by ExifTool");
+  EXPECT_EQ(Get("harbour.jpg", "xmp:Rating"), "Five Stars");
+  EXPECT_EQ(Get("harbour.jpg", "dc:subject"), "harbour; dawn; boats; east");
+  EXPECT_EQ(Get("harbour.jpg", "Iptc4xmpCore:CountryCode"), "CA");
+  EXPECT_EQ(Get("interview.mp4", "xmpDM:takeNumber"), "9");
+  EXPECT_EQ(Get("interview.mp4", "xmpDM:markers[3]/xmpDM:name"), "Wrap");
+}
+
+}  // namespace
