@@ -49,9 +49,12 @@ bool IsDateEntry(const EntryDefinition& entry) {
 
 // ---- Storage forms ----
 // Each has a reader (false when nothing could be read) and a writer; both
-// throw the toolkit's error on failure.
+// throw the toolkit's error on failure. kReadsAbsentAsFalse tells whether
+// the reader itself answers false for a missing property, which spares the
+// generic procedure a separate existence test on the hot path.
 
 struct SimpleText {
+  static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
     return meta.GetProperty(path.namespaceURI, path.description, &out);
   }
@@ -60,7 +63,9 @@ struct SimpleText {
   }
 };
 
+// Catenating an absent array gives an empty text, not a failure.
 struct ArrayText {
+  static constexpr bool kReadsAbsentAsFalse = false;
   bool ordered;
   ovraxmp::XMP_OptionBits Options() const {
     return ordered ? ovraxmp::kXMP_PropArrayIsOrdered : ovraxmp::kXMP_NoOptions;
@@ -76,6 +81,7 @@ struct ArrayText {
 };
 
 struct AltText {
+  static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
     std::string actualLanguage;
     return meta.GetLocalizedText(path.namespaceURI, path.description, std::string(),
@@ -89,6 +95,7 @@ struct AltText {
 
 // Read as text and normalised through the toolkit's date conversion.
 struct DateText {
+  static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
     std::string stored;
     if (!meta.GetProperty(path.namespaceURI, path.description, &stored)) return false;
@@ -105,6 +112,7 @@ struct DateText {
 };
 
 struct BoolValue {
+  static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, bool& out) const {
     return meta.GetProperty_Bool(path.namespaceURI, path.description, &out);
   }
@@ -114,6 +122,7 @@ struct BoolValue {
 };
 
 struct IntValue {
+  static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, int& out) const {
     std::int32_t value = 0;
     if (!meta.GetProperty_Int(path.namespaceURI, path.description, &value)) return false;
@@ -126,6 +135,7 @@ struct IntValue {
 };
 
 struct Int64Value {
+  static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, long long& out) const {
     std::int64_t value = 0;
     if (!meta.GetProperty_Int64(path.namespaceURI, path.description, &value)) return false;
@@ -138,6 +148,7 @@ struct Int64Value {
 };
 
 struct DoubleValue {
+  static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, double& out) const {
     return meta.GetProperty_Float(path.namespaceURI, path.description, &out);
   }
@@ -147,6 +158,7 @@ struct DoubleValue {
 };
 
 struct DateValue {
+  static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, Date& out) const {
     std::string stored;
     if (!meta.GetProperty(path.namespaceURI, path.description, &stored)) return false;
@@ -176,7 +188,10 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, T& out, GetValueResult* result,
       SetResult(result, ValueMixed);
       return false;
     }
-    if (!meta.DoesPropertyExist(path.namespaceURI, path.description)) return false;
+    if (!Storage::kReadsAbsentAsFalse &&
+        !meta.DoesPropertyExist(path.namespaceURI, path.description)) {
+      return false;
+    }
     T value{};
     if (!storage.Read(meta, path, value)) return false;
     out = std::move(value);
@@ -219,7 +234,10 @@ bool SameAsWritten(const UTF8String& readBack, const UTF8String& written) {
 template <class T, class Storage>
 boost::optional<T> ReadCurrent(const XMPMeta& meta, const Path& path, const Storage& storage) {
   try {
-    if (!meta.DoesPropertyExist(path.namespaceURI, path.description)) return boost::none;
+    if (!Storage::kReadsAbsentAsFalse &&
+        !meta.DoesPropertyExist(path.namespaceURI, path.description)) {
+      return boost::none;
+    }
     T value{};
     if (storage.Read(meta, path, value)) return value;
   } catch (const std::exception&) {
