@@ -84,10 +84,12 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
       xmp_files_free(file);
       return false;
     }
-    XmpOpenFileOptions options{};
-    XmpFileType type = XMP_FT_UNKNOWN;
-    XmpFileFormatOptions handler{};
-    if (!xmp_files_get_file_info(file, nullptr, &options, &type, &handler)) {
+    // The toolkit stores flag combinations outside the enums' ranges: read
+    // them as plain integers.
+    std::uint32_t options = 0, type = XMP_FT_UNKNOWN, handler = 0;
+    if (!xmp_files_get_file_info(file, nullptr, reinterpret_cast<XmpOpenFileOptions*>(&options),
+                                 reinterpret_cast<XmpFileType*>(&type),
+                                 reinterpret_cast<XmpFileFormatOptions*>(&handler))) {
       xmp_files_free(file);
       return false;
     }
@@ -205,7 +207,7 @@ XMP_FileFormat XMPFiles::CheckFileFormat(const std::string& filePath) {
   if (!IsRegularFile(filePath)) return kXMP_UnknownFile;
   if (IsSidecarPath(filePath)) return kXMP_XMLFile;
   detail::EnsureStarted();
-  return xmp_files_check_file_format(filePath.c_str());
+  return static_cast<XMP_FileFormat>(xmp_files_check_file_format(filePath.c_str()));
 }
 
 bool XMPFiles::GetFormatInfo(XMP_FileFormat format, XMP_OptionBits* handlerFlags) {
@@ -215,8 +217,9 @@ bool XMPFiles::GetFormatInfo(XMP_FileFormat format, XMP_OptionBits* handlerFlags
   }
   if (format == kXMP_UnknownFile) return false;
   detail::EnsureStarted();
-  XmpFileFormatOptions options{};
-  if (!xmp_files_get_format_info(static_cast<XmpFileType>(format), &options)) return false;
+  std::uint32_t options = 0;
+  if (!xmp_files_get_format_info(static_cast<XmpFileType>(format), reinterpret_cast<XmpFileFormatOptions*>(&options)))
+    return false;
   if (handlerFlags) *handlerFlags = options;
   return true;
 }
