@@ -382,18 +382,25 @@ bool GetValue(XMPMetaRef xmp, const Path& path, UTF8String& value, GetValueResul
   UTF8String raw;
   bool read = IsDateEntry(*entry) && ReadValue(xmp, path, raw, result, DateText());
   if (!read && primitive) read = ReadStoredText(xmp, path, primitive, raw, result);
-  if (!read) {
-    // Internal properties that are not stored may be constructed from others.
-    if (path.internal) return GetConstructedValue(xmp, path, value, result);
+  try {
+    if (!read) {
+      // Internal properties that are not stored may be constructed from others.
+      if (path.internal) return GetConstructedValue(xmp, path, value, result);
+      return false;
+    }
+    UTF8String text;
+    if (path.internal && !IsAllMetadataForcedWritable()) text = FormatValue(xmp, path, raw);
+    if (text.empty()) text = raw;
+    if (!text.empty()) ValidateText(xmp, path, *entry, primitive, text);
+    value = std::move(text);
+    return true;
+  } catch (...) {
+    // A formatter or aggregator that fails (an empty registered function
+    // throws) must not reach the caller.
+    ReportInvalidData(kErrorReadingXMP, path);
+    SetResult(result, ValueError);
     return false;
   }
-
-  UTF8String text;
-  if (path.internal && !IsAllMetadataForcedWritable()) text = FormatValue(xmp, path, raw);
-  if (text.empty()) text = raw;
-  if (!text.empty()) ValidateText(xmp, path, *entry, primitive, text);
-  value = std::move(text);
-  return true;
 }
 
 bool GetRawStringValue(XMPMetaRef xmp, const Path& path, UTF8String& value,
