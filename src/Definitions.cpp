@@ -1,6 +1,7 @@
 // The definitions model: primitive types, their predicates, Date and the
 // factories.
 #include <iterator>
+#include <string_view>
 #include <tuple>
 
 #include <ovrametadata/Definitions.h>
@@ -9,7 +10,7 @@ namespace ovrametadata {
 
 namespace {
 
-const char* const kPrimitiveTypeIds[] = {"integer",    "real",         "text",
+const std::string_view kPrimitiveTypeIds[] = {"integer",    "real",         "text",
                                          "boolean",    "openchoice",   "closedchoice",
                                          "bag",        "seq",          "alt"};
 
@@ -46,7 +47,7 @@ bool operator==(Date const& a, Date const& b) {
 
 UTF8String PrimitiveTypeAsPrimitiveTypeId(PrimitiveType type) {
   const auto index = static_cast<unsigned>(type);
-  return index < std::size(kPrimitiveTypeIds) ? kPrimitiveTypeIds[index] : "";
+  return index < std::size(kPrimitiveTypeIds) ? UTF8String(kPrimitiveTypeIds[index]) : "";
 }
 
 boost::optional<PrimitiveType> PrimitiveTypeIdAsPrimitiveType(UTF8String const& typeId) {
@@ -54,8 +55,9 @@ boost::optional<PrimitiveType> PrimitiveTypeIdAsPrimitiveType(UTF8String const& 
       kPrimitiveType_integer,    kPrimitiveType_real,         kPrimitiveType_text,
       kPrimitiveType_boolean,    kPrimitiveType_openchoice,   kPrimitiveType_closedchoice,
       kPrimitiveType_bag,        kPrimitiveType_alt,          kPrimitiveType_seq};
+  const std::string_view id = typeId;  // compares lengths before bytes
   for (PrimitiveType type : kOrder) {
-    if (typeId == kPrimitiveTypeIds[type]) return type;
+    if (id == kPrimitiveTypeIds[type]) return type;
   }
   return boost::none;
 }

@@ -2,6 +2,10 @@
 // points.
 #include "DefinitionsParser.h"
 
+#include <string_view>
+
+#include <boost/make_shared.hpp>
+
 #include <ovracore/Localizer.h>
 #include <ovracore/Strings.h>
 
@@ -9,31 +13,108 @@
 
 namespace ovrametadata {
 
+using namespace std::string_view_literals;
+
 const char* const kDefinitionsUINamespace = "http://ns.ovrametadata.org/xmp/propsheet/ui/";
 
 namespace {
 
 const char* const kInvalidXML = "$$$/ovrametadata/DefinitionsParser/InvalidXML=invalid XML.";
 
-// An absent attribute reads as the empty string.
-UTF8String Attribute(const ovracore::Attributes& attributes, std::string_view name,
-                     std::string_view namespaceURI = {}) {
-  return ovracore::DecodeXMLReserved(attributes.Get(name, namespaceURI));
+// The attributes this format knows, taken in one pass over the element's
+// attributes (start-up parses every built-in file, so lookups one by one
+// would dominate). An absent attribute reads as the empty string.
+struct DefinitionAttributes {
+  UTF8String namespaceURI, prefix, label, description, dynamic, name, type, extends, elementType,
+      pattern, max, min, deprecated, category, rawValue, multiLine;
+  bool hasDeprecated = false;
+};
+
+// Every value passes through the reserved-character decoding as well.
+UTF8String Decoded(std::string_view value) {
+  return value.find('&') == std::string_view::npos ? UTF8String(value)
+                                                   : ovracore::DecodeXMLReserved(value);
 }
 
-void ReadLabelAndDescription(LocalizedDefinition& definition,
-                             const ovracore::Attributes& attributes) {
-  const UTF8String label = Attribute(attributes, "label");
-  const UTF8String description = Attribute(attributes, "description");
-  definition.labelSource = ovracore::ToUTF16(label);
-  definition.descriptionSource = ovracore::ToUTF16(description);
-  definition.label = ovracore::ZString(label);
-  definition.description = ovracore::ZString(description);
+DefinitionAttributes ReadAttributes(const ovracore::Attributes& attributes) {
+  DefinitionAttributes read;
+  for (const auto& [key, value] : attributes.All()) {
+    const std::string_view name = key.second;
+    if (!key.first.empty()) {
+      if (key.first == kDefinitionsUINamespace && name == "multiLine"sv) read.multiLine = Decoded(value);
+      continue;
+    }
+    UTF8String* target = nullptr;
+    if (name == "namespace"sv) target = &read.namespaceURI;
+    else if (name == "prefix"sv) target = &read.prefix;
+    else if (name == "label"sv) target = &read.label;
+    else if (name == "description"sv) target = &read.description;
+    else if (name == "dynamic"sv) target = &read.dynamic;
+    else if (name == "name"sv) target = &read.name;
+    else if (name == "type"sv) target = &read.type;
+    else if (name == "extends"sv) target = &read.extends;
+    else if (name == "element_type"sv) target = &read.elementType;
+    else if (name == "pattern"sv) target = &read.pattern;
+    else if (name == "max"sv) target = &read.max;
+    else if (name == "min"sv) target = &read.min;
+    else if (name == "deprecated"sv) {
+      target = &read.deprecated;
+      read.hasDeprecated = true;
+    }
+    else if (name == "category"sv) target = &read.category;
+    else if (name == "raw_value"sv) target = &read.rawValue;
+    if (target) *target = Decoded(value);
+  }
+  return read;
+}
+
+// Texts without a key, placeholder or escape come out of the localiser
+// unchanged, so they skip it.
+UTF16String Localized(UTF8String const& text, UTF16String const& asWritten) {
+  if (text.compare(0, 4, "$$$/") != 0 && text.find_first_of("#@") == UTF8String::npos) {
+    return asWritten;
+  }
+  return ovracore::ZString(text);
+}
+
+void ReadLabelAndDescription(LocalizedDefinition& definition, DefinitionAttributes const& read) {
+  definition.labelSource = ovracore::ToUTF16(read.label);
+  definition.descriptionSource = ovracore::ToUTF16(read.description);
+  definition.label = Localized(read.label, definition.labelSource);
+  definition.description = Localized(read.description, definition.descriptionSource);
+}
+
+// The attributes shared by properties, fields, qualifiers and types, in
+// the order the format defines.
+void ReadEntryAttributes(EntryDefinition& entry, DefinitionAttributes const& read) {
+  if (!read.type.empty()) entry.type = read.type;
+  if (!read.name.empty()) entry.name = read.name;
+  if (!read.extends.empty()) {
+    entry.extends = PrimitiveTypeIdAsPrimitiveType(read.extends);
+    if (!entry.extends) {
+      // Reported without a source: the entry's file is not known here.
+      SendError(kDefinitionParsingError,
+                ovracore::ZString("$$$/ovrametadata/ParseEntryDefinition/InvalidExtendType=Entry "
+                                  "must extend valid primitive type"),
+                UTF16String());
+    }
+  }
+  if (!read.elementType.empty()) entry.constraints.elementType = read.elementType;
+  if (!read.pattern.empty()) entry.constraints.pattern = read.pattern;
+  // A bound that is not a number is left out.
+  if (!read.max.empty()) {
+    if (const auto value = ovracore::ToDouble(read.max)) entry.constraints.max = *value;
+  }
+  if (!read.min.empty()) {
+    if (const auto value = ovracore::ToDouble(read.min)) entry.constraints.min = *value;
+  }
+  if (read.hasDeprecated) entry.constraints.deprecated = read.deprecated == "true";
+  ReadLabelAndDescription(entry, read);
 }
 
 // Entries without a label show their name.
-void ApplyLabelRule(EntryDefinition& entry, const ovracore::Attributes& attributes) {
-  if (entry.label.empty()) entry.label = ovracore::ToUTF16(Attribute(attributes, "name"));
+void ApplyLabelRule(EntryDefinition& entry, DefinitionAttributes const& read) {
+  if (entry.label.empty()) entry.label = ovracore::ToUTF16(read.name);
 }
 
 }  // namespace
@@ -47,10 +128,10 @@ void DefinitionsParser::Report(UTF16String const& message) {
 
 void DefinitionsParser::StartElement(const UTF8String& namespaceURI, const UTF8String& localName,
                                      const ovracore::Attributes& attributes) {
-  if (namespaceURI.empty() && localName == "xmp_property") {
+  if (namespaceURI.empty() && localName == "xmp_property"sv) {
     StartProperty(attributes);
   } else if (namespaceURI == kDefinitionsUINamespace) {
-    if (localName == "separator") StartSeparator(attributes);
+    if (localName == "separator"sv) StartSeparator(attributes);
   } else {
     AbstractParseHandler::StartElement(namespaceURI, localName, attributes);
   }
@@ -58,17 +139,17 @@ void DefinitionsParser::StartElement(const UTF8String& namespaceURI, const UTF8S
 
 void DefinitionsParser::StartElementNoNamespace(const UTF8String& name,
                                                 const ovracore::Attributes& attributes) {
-  if (name == "xmp_schema") {
+  if (name == "xmp_schema"sv) {
     StartSchema(attributes);
-  } else if (name == "xmp_type") {
+  } else if (name == "xmp_type"sv) {
     StartType(attributes);
-  } else if (name == "xmp_field") {
+  } else if (name == "xmp_field"sv) {
     StartField(attributes);
-  } else if (name == "xmp_choice") {
+  } else if (name == "xmp_choice"sv) {
     StartChoice(attributes);
-  } else if (name == "xmp_qualifier") {
+  } else if (name == "xmp_qualifier"sv) {
     StartQualifier(attributes);
-  } else if (name != "xmp_definitions") {
+  } else if (name != "xmp_definitions"sv) {
     Report(ovracore::ZString(
         "$$$/ovrametadata/DefinitionsParser/InvalidDefinitionsTag=invalid definitions tag "
         "#{quot}@0#{quot}.",
@@ -77,20 +158,22 @@ void DefinitionsParser::StartElementNoNamespace(const UTF8String& name,
 }
 
 void DefinitionsParser::StartSchema(const ovracore::Attributes& attributes) {
-  auto schema = boost::shared_ptr<SchemaDefinition>(new SchemaDefinition);
-  schema->namespaceURI = Attribute(attributes, "namespace");
-  schema->prefix = Attribute(attributes, "prefix");
-  ReadLabelAndDescription(*schema, attributes);
-  schema->isDynamic = Attribute(attributes, "dynamic") == "true";
+  const DefinitionAttributes read = ReadAttributes(attributes);
+  auto schema = boost::make_shared<SchemaDefinition>();
+  schema->namespaceURI = read.namespaceURI;
+  schema->prefix = read.prefix;
+  ReadLabelAndDescription(*schema, read);
+  schema->isDynamic = read.dynamic == "true";
   if (schema->label.empty()) schema->label = ovracore::ToUTF16(schema->prefix);
   currentProperties = &schema->properties;
   mResult.first.push_back(schema);
 }
 
 void DefinitionsParser::StartType(const ovracore::Attributes& attributes) {
-  auto type = boost::shared_ptr<TypeDefinition>(new TypeDefinition);
-  ReadEntryAttributes(*type, attributes);
-  ApplyLabelRule(*type, attributes);
+  const DefinitionAttributes read = ReadAttributes(attributes);
+  auto type = boost::make_shared<TypeDefinition>();
+  ReadEntryAttributes(*type, read);
+  ApplyLabelRule(*type, read);
   currentFields = &type->fields;
   currentChoices = &type->constraints.choices;
   currentQualifiers = &type->constraints.qualifiers;
@@ -98,17 +181,18 @@ void DefinitionsParser::StartType(const ovracore::Attributes& attributes) {
 }
 
 void DefinitionsParser::StartField(const ovracore::Attributes& attributes) {
+  const DefinitionAttributes read = ReadAttributes(attributes);
   if (!currentFields) {
     Report(ovracore::ZString(
         "$$$/ovrametadata/DefinitionsParser/InvalidFieldTag=invalid field tag #{quot}@0#{quot}.",
-        {Attribute(attributes, "name")}));
+        {read.name}));
     return;
   }
-  auto field = boost::shared_ptr<FieldDefinition>(new FieldDefinition);
-  field->namespaceURI = Attribute(attributes, "namespace");
-  field->prefix = Attribute(attributes, "prefix");
-  ReadEntryAttributes(*field, attributes);
-  ApplyLabelRule(*field, attributes);
+  auto field = boost::make_shared<FieldDefinition>();
+  field->namespaceURI = read.namespaceURI;
+  field->prefix = read.prefix;
+  ReadEntryAttributes(*field, read);
+  ApplyLabelRule(*field, read);
   currentChoices = &field->constraints.choices;
   currentQualifiers = &field->constraints.qualifiers;
   currentFields->push_back(field);
@@ -120,11 +204,11 @@ void DefinitionsParser::StartChoice(const ovracore::Attributes& attributes) {
         "$$$/ovrametadata/DefinitionsParser/InvalidChoiceTag=invalid choice tag."));
     return;
   }
-  auto choice = boost::shared_ptr<ChoiceDefinition>(new ChoiceDefinition);
-  choice->rawValue = Attribute(attributes, "raw_value");
-  const UTF8String label = Attribute(attributes, "label");
-  choice->labelSource = ovracore::ToUTF16(label);
-  choice->label = ovracore::ZString(label);
+  const DefinitionAttributes read = ReadAttributes(attributes);
+  auto choice = boost::make_shared<ChoiceDefinition>();
+  choice->rawValue = read.rawValue;
+  choice->labelSource = ovracore::ToUTF16(read.label);
+  choice->label = Localized(read.label, choice->labelSource);
   if (choice->label.empty()) choice->label = ovracore::ToUTF16(choice->rawValue);
   currentChoices->push_back(choice);
 }
@@ -135,31 +219,28 @@ void DefinitionsParser::StartQualifier(const ovracore::Attributes& attributes) {
         "$$$/ovrametadata/DefinitionsParser/InvalidQualifierTag=invalid qualifier tag."));
     return;
   }
-  auto qualifier = boost::shared_ptr<QualifierDefinition>(new QualifierDefinition);
-  qualifier->namespaceURI = Attribute(attributes, "namespace");
-  qualifier->prefix = Attribute(attributes, "prefix");
-  ReadEntryAttributes(*qualifier, attributes);
-  ApplyLabelRule(*qualifier, attributes);
+  const DefinitionAttributes read = ReadAttributes(attributes);
+  auto qualifier = boost::make_shared<QualifierDefinition>();
+  qualifier->namespaceURI = read.namespaceURI;
+  qualifier->prefix = read.prefix;
+  ReadEntryAttributes(*qualifier, read);
+  ApplyLabelRule(*qualifier, read);
   // The qualifier list stays current: following qualifiers are siblings.
   currentChoices = &qualifier->constraints.choices;
   currentQualifiers->push_back(qualifier);
 }
 
 void DefinitionsParser::StartProperty(const ovracore::Attributes& attributes) {
+  const DefinitionAttributes read = ReadAttributes(attributes);
   if (!currentProperties) {
-    Report(ovracore::ZString(
-        "$$$/ovrametadata/DefinitionsParser/InvalidPropertyTag=invalid property tag "
-        "#{quot}@0#{quot}.",
-        {Attribute(attributes, "name")}));
+    ReportInvalidProperty(read.name);
     return;
   }
-  auto property = boost::shared_ptr<PropertyDefinition>(new PropertyDefinition);
-  property->isInternal = Attribute(attributes, "category") == "internal";
-  ReadEntryAttributes(*property, attributes);
-  ApplyLabelRule(*property, attributes);
-  if (Attribute(attributes, "multiLine", kDefinitionsUINamespace) == "true") {
-    property->uiHints = PropertyUIHints{false, true};
-  }
+  auto property = boost::make_shared<PropertyDefinition>();
+  property->isInternal = read.category == "internal";
+  ReadEntryAttributes(*property, read);
+  ApplyLabelRule(*property, read);
+  if (read.multiLine == "true") property->uiHints = PropertyUIHints{false, true};
   currentProperties->push_back(property);
   currentChoices = &property->constraints.choices;
   currentQualifiers = &property->constraints.qualifiers;
@@ -167,10 +248,7 @@ void DefinitionsParser::StartProperty(const ovracore::Attributes& attributes) {
 
 void DefinitionsParser::StartSeparator(const ovracore::Attributes& attributes) {
   if (!currentProperties) {
-    Report(ovracore::ZString(
-        "$$$/ovrametadata/DefinitionsParser/InvalidPropertyTag=invalid property tag "
-        "#{quot}@0#{quot}.",
-        {Attribute(attributes, "name")}));
+    ReportInvalidProperty(Decoded(attributes.Get("name")));
     return;
   }
   if (currentProperties->empty()) return;
@@ -182,40 +260,11 @@ void DefinitionsParser::StartSeparator(const ovracore::Attributes& attributes) {
   }
 }
 
-void DefinitionsParser::ReadEntryAttributes(EntryDefinition& entry,
-                                            const ovracore::Attributes& attributes) {
-  const UTF8String type = Attribute(attributes, "type");
-  if (!type.empty()) entry.type = type;
-  const UTF8String name = Attribute(attributes, "name");
-  if (!name.empty()) entry.name = name;
-  const UTF8String extends = Attribute(attributes, "extends");
-  if (!extends.empty()) {
-    entry.extends = PrimitiveTypeIdAsPrimitiveType(extends);
-    if (!entry.extends) {
-      // Reported without a source, as the message names no file.
-      SendError(kDefinitionParsingError,
-                ovracore::ZString("$$$/ovrametadata/ParseEntryDefinition/InvalidExtendType=Entry "
-                                  "must extend valid primitive type"),
-                UTF16String());
-    }
-  }
-  const UTF8String elementType = Attribute(attributes, "element_type");
-  if (!elementType.empty()) entry.constraints.elementType = elementType;
-  const UTF8String pattern = Attribute(attributes, "pattern");
-  if (!pattern.empty()) entry.constraints.pattern = pattern;
-  // A bound that is not a number is left out.
-  const UTF8String max = Attribute(attributes, "max");
-  if (!max.empty()) {
-    if (const auto value = ovracore::ToDouble(max)) entry.constraints.max = *value;
-  }
-  const UTF8String min = Attribute(attributes, "min");
-  if (!min.empty()) {
-    if (const auto value = ovracore::ToDouble(min)) entry.constraints.min = *value;
-  }
-  if (attributes.Has("deprecated")) {
-    entry.constraints.deprecated = Attribute(attributes, "deprecated") == "true";
-  }
-  ReadLabelAndDescription(entry, attributes);
+void DefinitionsParser::ReportInvalidProperty(UTF8String const& name) {
+  Report(ovracore::ZString(
+      "$$$/ovrametadata/DefinitionsParser/InvalidPropertyTag=invalid property tag "
+      "#{quot}@0#{quot}.",
+      {name}));
 }
 
 // --- Entry points

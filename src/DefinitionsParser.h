@@ -33,7 +33,7 @@ class DefinitionsParser : public ovracore::AbstractParseHandler {
   void StartQualifier(const ovracore::Attributes& attributes);
   void StartProperty(const ovracore::Attributes& attributes);
   void StartSeparator(const ovracore::Attributes& attributes);
-  void ReadEntryAttributes(EntryDefinition& entry, const ovracore::Attributes& attributes);
+  void ReportInvalidProperty(UTF8String const& name);
   void Report(UTF16String const& message);
 
   DefinitionsPair& mResult;
