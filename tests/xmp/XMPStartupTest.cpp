@@ -114,3 +114,21 @@ TEST(XMPNamespaces, LookupsAnswerFalseForUnknownAndAcceptPrefixWithOrWithoutColo
   EXPECT_TRUE(XMPMeta::GetNamespacePrefix(kXMP_NS_Transient, &text));
   EXPECT_EQ(text, "xmpx:");
 }
+
+TEST(XMPStartup, LastTerminateStopsTheToolkitAndInitializeRestartsIt) {
+  ASSERT_TRUE(XMPMeta::RegisterNamespace("http://ovra.test/ns/cycle/", "ovcycle", nullptr));
+  XMPMeta survivor;
+  survivor.SetProperty(kXMP_NS_XMP, "Label", "kept");
+  // Give back the holds of the test environment: the count reaches zero.
+  XMPFiles::Terminate();
+  XMPMeta::Terminate();
+  XMPMeta::Terminate();  // extra calls are ignored
+  ASSERT_TRUE(XMPMeta::Initialize());
+  ASSERT_TRUE(XMPFiles::Initialize("/nonexistent/plugins"));
+  std::string prefix;
+  EXPECT_FALSE(XMPMeta::GetNamespacePrefix("http://ovra.test/ns/cycle/", &prefix));  // a fresh registry
+  EXPECT_TRUE(XMPMeta::GetNamespacePrefix(kXMP_NS_Transient, &prefix));
+  std::string value;
+  EXPECT_TRUE(survivor.GetProperty(kXMP_NS_XMP, "Label", &value));
+  EXPECT_EQ(value, "kept");
+}
