@@ -119,7 +119,9 @@ bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out) {
       return false;
     }
   }
-  const UTF16String path = ToUTF16(name);
+  // Media applications hand the toolkit absolute paths; its handlers for
+  // folder-based formats misread relative ones with a folder in them.
+  const UTF16String path = ToUTF16(std::filesystem::absolute(name, error).lexically_normal().string());
   auto provider = boost::make_shared<FileProvider>(path);
   reporter.FlushLibrary(name);
   if (!provider->MetaDataAccess() && utility::GetXMPFormat(path) == kUnknownFormat) {
@@ -305,8 +307,7 @@ int ShowCommand(const std::vector<std::string>& files, bool each) {
     for (const auto& name : files) {
       OpenedFile file;
       if (!OpenFile(name, reporter, file)) continue;
-      MetaDataReadAccess reader(file.provider);
-      const auto schemas = ReadAllValues(*reader, options);
+      const auto schemas = ReadAllValues(file.provider, options);
       reporter.FlushLibrary(name);
       if (files.size() > 1) {
         std::cout << (first ? "" : "\n") << "== " << name << " ==\n";
@@ -335,8 +336,7 @@ int ShowCommand(const std::vector<std::string>& files, bool each) {
   progress.Clear();
   reporter.SetProgress(nullptr);
   if (opened == 0) return reporter.status();
-  MetaDataReadAccess reader(aggregate);
-  const auto schemas = ReadAllValues(*reader, options);
+  const auto schemas = ReadAllValues(aggregate, options);
   reporter.FlushLibrary(std::to_string(opened) + " files");
   if (schemas.empty()) std::cout << "(no metadata)\n";
   PrintSchemas(std::cout, schemas);
@@ -389,7 +389,7 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
     MetaDataReadAccess reader(file.provider);
     Json properties = Json::array();
     if (names.empty()) {
-      for (const auto& schema : ReadAllValues(*reader, readOptions)) {
+      for (const auto& schema : ReadAllValues(file.provider, readOptions)) {
         for (const auto& value : schema.values) properties.push_back(NodeJson(value, true));
       }
     }

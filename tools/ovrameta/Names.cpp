@@ -81,7 +81,9 @@ std::string Quoted(const std::string& text) { return "\"" + text + "\""; }
 }  // namespace
 
 std::vector<SchemaDefinitionPtr> KnownSchemas() {
-  std::vector<SchemaDefinitionPtr> schemas;
+  // The registry is filled at start-up and not changed while the tool runs.
+  static std::vector<SchemaDefinitionPtr> schemas;
+  if (!schemas.empty()) return schemas;
   std::set<std::string> seen;
   auto add = [&](const SchemaDefinitionPtr& schema) {
     if (schema && seen.insert(schema->namespaceURI).second) schemas.push_back(schema);
@@ -113,13 +115,18 @@ const std::vector<boost::shared_ptr<ChoiceDefinition>>& ChoicesOf(const EntryDef
   return entry.constraints.choices;
 }
 
-TypeDefinitionPtr StructTypeOf(const Path& path, const EntryDefinition& entry) {
+boost::optional<PrimitiveType> PrimitiveTypeOfEntry(const EntryDefinition& entry) {
+  if (entry.type) return PrimitiveTypeOf(*entry.type);
+  return entry.extends;
+}
+
+TypeDefinitionPtr StructTypeOf(const Path& /*path*/, const EntryDefinition& entry) {
   // An item of an array of structures resolves to the structure type itself.
   if (const auto* type = dynamic_cast<const TypeDefinition*>(&entry)) {
     if (!type->fields.empty()) return TypeIdDefinition(type->name);
   }
-  if (PrimitiveTypeOfPath(path)) return TypeDefinitionPtr();
-  const auto type = TypeEntryDefinition(path);
+  if (PrimitiveTypeOfEntry(entry) || !entry.type) return TypeDefinitionPtr();
+  const auto type = TypeIdDefinition(*entry.type);
   return type && !type->fields.empty() ? type : TypeDefinitionPtr();
 }
 

@@ -40,6 +40,11 @@ bool ResolveName(const std::string& name, ResolvedName& out, std::string& error)
 const std::vector<boost::shared_ptr<ovrametadata::ChoiceDefinition>>& ChoicesOf(
     const ovrametadata::EntryDefinition& entry);
 
+// The primitive type of an entry, as PrimitiveTypeOfPath gives it for a
+// path whose definition is entry.
+boost::optional<ovrametadata::PrimitiveType> PrimitiveTypeOfEntry(
+    const ovrametadata::EntryDefinition& entry);
+
 // The structure type of the value at path (a structure property or field,
 // or an item of an array of structures); null when it is not a structure.
 ovrametadata::TypeDefinitionPtr StructTypeOf(const ovrametadata::Path& path,

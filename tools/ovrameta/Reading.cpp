@@ -1,6 +1,12 @@
 #include "Reading.h"
 
+#include <set>
+
+#include <boost/make_shared.hpp>
+
+#include <ovrametadata/Format.h>
 #include <ovrametadata/Initialize.h>
+#include <ovrametadata/Providers.h>
 #include <ovrametadata/ValueEditing.h>
 #include <ovrametadata/Values.h>
 
@@ -63,29 +69,48 @@ void Describe(const EntryDefinition& entry, const boost::optional<PrimitiveType>
   node.primitive = primitive ? PrimitiveTypeAsPrimitiveTypeId(*primitive) : std::string();
 }
 
+// Only internal properties can have a value without storing one; asking
+// for the constructed value directly spares resolving the definition of
+// every absent property.
+bool ReadConstructedValue(XMPMetaRef xmp, const Path& path, const std::string& name,
+                          const EntryDefinition& entry, ValueNode& out) {
+  UTF8String constructed;
+  GetValueResult result = ValueAbsent;
+  if (!path.internal || !GetConstructedValue(xmp, path, constructed, &result)) return false;
+  ValueNode node;
+  node.name = name;
+  Describe(entry, PrimitiveTypeOfEntry(entry), node);
+  node.value = DisplayText(entry, constructed);
+  out = std::move(node);
+  return true;
+}
+
 }  // namespace
 
 bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
-               const ReadOptions& options, ValueNode& out) {
+               const ReadOptions& options, ValueNode& out,
+               boost::shared_ptr<EntryDefinition> entry) {
   if (!xmp || path.description.empty()) return false;
-  // Only internal properties can have a value without storing one.
-  if (!path.internal && !HasValue(xmp, path)) return false;
-  const auto entry = PathEntryDefinition(path);
+  if (!HasValue(xmp, path)) {
+    if (!path.internal) return false;
+    if (!entry) entry = PathEntryDefinition(path);
+    return entry && ReadConstructedValue(xmp, path, name, *entry, out);
+  }
+  if (!entry) entry = PathEntryDefinition(path);
   if (!entry) return false;
-  const auto primitive = PrimitiveTypeOfPath(path);
+  const auto primitive = PrimitiveTypeOfEntry(*entry);
   ValueNode node;
   node.name = name;
   Describe(*entry, primitive, node);
 
   if (const auto structType = StructTypeOf(path, *entry)) {
-    if (!HasValue(xmp, path)) return false;
     node.kind = ValueNode::kStruct;
     for (const auto& field : structType->fields) {
       if (!field) continue;
       const Path fieldPath = FieldPath(path, *entry, field);
       ValueNode child;
       if (ReadValue(xmp, fieldPath, name + "/" + field->prefix + ":" + field->name, options,
-                    child)) {
+                    child, field)) {
         node.children.push_back(std::move(child));
       }
     }
@@ -125,8 +150,7 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
       out = std::move(node);
       return true;
     }
-    if (!HasValue(xmp, path)) return false;
-    ForEachItem(xmp, path, [&](const Path& item, int index) {
+      ForEachItem(xmp, path, [&](const Path& item, int index) {
       ValueNode child;
       const std::string itemName = name + "[" + std::to_string(index) + "]";
       if (ReadValue(xmp, item, itemName, options, child)) {
@@ -154,22 +178,95 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
   return true;
 }
 
-std::vector<SchemaValues> ReadAllValues(XMPMetaRef xmp, const ReadOptions& options) {
-  std::vector<SchemaValues> all;
-  if (!xmp) return all;
+namespace {
+
+struct PropertyRef {
+  PropertyDefinitionPtr property;
+  Path path;
+  std::string name;
+};
+
+struct SchemaRef {
+  SchemaDefinitionPtr schema;
+  std::string label;
+  std::vector<PropertyRef> properties;
+};
+
+// The paths of every known property, built once: a run over many files asks
+// for the same properties in every file.
+const std::vector<SchemaRef>& KnownProperties() {
+  static std::vector<SchemaRef> schemas;
+  if (!schemas.empty()) return schemas;
   for (const auto& schema : KnownSchemas()) {
-    SchemaValues values;
-    values.schema = schema;
-    values.label = LabelOr(schema->label, schema->prefix);
+    SchemaRef ref;
+    ref.schema = schema;
+    ref.label = LabelOr(schema->label, schema->prefix);
     for (const auto& property : schema->properties) {
       if (!property) continue;
-      const Path path = CreatePathFromSchemaProperty(schema, property);
+      PropertyRef propertyRef;
+      propertyRef.property = property;
+      propertyRef.path = CreatePathFromSchemaProperty(schema, property);
+      propertyRef.name = schema->prefix + ":" + property->name;
+      ref.properties.push_back(std::move(propertyRef));
+    }
+    schemas.push_back(std::move(ref));
+  }
+  return schemas;
+}
+
+}  // namespace
+
+namespace {
+
+// The local names of the top-level properties that the provider's packet
+// stores in namespaceURI: the aggregate provider lists every stored
+// property path of a namespace, which spares asking for each of the
+// hundreds of defined properties in turn.
+std::set<std::string> StoredPropertyNames(AggregateProvider& presence,
+                                          const std::string& namespaceURI) {
+  std::vector<PropertyDefinitionPtr> stored;
+  presence.GetAllPathsForDynamicSchema(namespaceURI, stored);
+  std::set<std::string> names;
+  for (const auto& property : stored) {
+    if (!property) continue;
+    const auto end = property->name.find_first_of("/[?");
+    names.insert(property->name.substr(0, end));
+  }
+  return names;
+}
+
+}  // namespace
+
+std::vector<SchemaValues> ReadAllValues(const boost::shared_ptr<MetaDataProvider>& provider,
+                                        const ReadOptions& options) {
+  std::vector<SchemaValues> all;
+  MetaDataReadAccess reader(provider);
+  XMPMetaRef xmp = *reader;
+  if (!xmp) return all;
+  auto presence = boost::dynamic_pointer_cast<AggregateProvider>(provider);
+  if (!presence) {
+    presence = boost::make_shared<AggregateProvider>();
+    presence->AddProvider(provider, true);
+  }
+  for (const auto& schema : KnownProperties()) {
+    const auto stored = StoredPropertyNames(*presence, schema.schema->namespaceURI);
+    SchemaValues values;
+    for (const auto& property : schema.properties) {
       ValueNode node;
-      if (ReadValue(xmp, path, schema->prefix + ":" + property->name, options, node)) {
+      if (stored.count(property.property->name)) {
+        if (ReadValue(xmp, property.path, property.name, options, node, property.property)) {
+          values.values.push_back(std::move(node));
+        }
+      } else if (property.path.internal &&
+                 ReadConstructedValue(xmp, property.path, property.name, *property.property,
+                                      node)) {
         values.values.push_back(std::move(node));
       }
     }
-    if (!values.values.empty()) all.push_back(std::move(values));
+    if (values.values.empty()) continue;
+    values.schema = schema.schema;
+    values.label = schema.label;
+    all.push_back(std::move(values));
   }
   return all;
 }

@@ -6,9 +6,11 @@
 #include <vector>
 
 #include <boost/optional.hpp>
+#include <boost/shared_ptr.hpp>
 
 #include <ovrametadata/Definitions.h>
 #include <ovrametadata/Paths.h>
+#include <ovrametadata/Providers.h>
 
 namespace ovrameta {
 
@@ -33,8 +35,10 @@ struct ReadOptions {
 
 // Reads the value at path, named name. False when nothing is stored there
 // (and, for internal properties, nothing can be constructed).
+// entry, when given, is the definition of the path (spares looking it up).
 bool ReadValue(XMPMetaRef xmp, const ovrametadata::Path& path, const std::string& name,
-               const ReadOptions& options, ValueNode& out);
+               const ReadOptions& options, ValueNode& out,
+               boost::shared_ptr<ovrametadata::EntryDefinition> entry = nullptr);
 
 struct SchemaValues {
   ovrametadata::SchemaDefinitionPtr schema;
@@ -42,7 +46,9 @@ struct SchemaValues {
   std::vector<ValueNode> values;
 };
 
-// Every known schema (see KnownSchemas) that has values in xmp, in order.
-std::vector<SchemaValues> ReadAllValues(XMPMetaRef xmp, const ReadOptions& options);
+// Every known schema (see KnownSchemas) that has values in the provider's
+// packet, in order.
+std::vector<SchemaValues> ReadAllValues(
+    const boost::shared_ptr<ovrametadata::MetaDataProvider>& provider, const ReadOptions& options);
 
 }  // namespace ovrameta
