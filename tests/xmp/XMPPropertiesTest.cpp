@@ -212,6 +212,24 @@ TEST_F(XMPProperties, ArraysAppendInsertCountAndDelete) {
   }
 }
 
+TEST_F(XMPProperties, StructureItemsCanBeInsertedAnywhere) {
+  XMPMeta meta;
+  meta.AppendArrayItem(kTestNS, "People", kXMP_PropArrayIsOrdered, "", kXMP_PropValueIsStruct);
+  meta.SetStructField(kTestNS, "People[1]", kTestNS, "Name", "second");
+  meta.SetArrayItem(kTestNS, "People", 1, "", kXMP_PropValueIsStruct | kXMP_InsertBeforeItem);
+  meta.SetStructField(kTestNS, "People[1]", kTestNS, "Name", "first");
+  meta.SetArrayItem(kTestNS, "People", kXMP_ArrayLastItem, "", kXMP_PropValueIsStruct | kXMP_InsertAfterItem);
+  meta.SetStructField(kTestNS, "People[3]", kTestNS, "Name", "third");
+  ASSERT_EQ(meta.CountArrayItems(kTestNS, "People"), 3);
+  EXPECT_EQ(Get(meta, kTestNS, "People[1]/ovt:Name"), "first");
+  EXPECT_EQ(Get(meta, kTestNS, "People[2]/ovt:Name"), "second");
+  EXPECT_EQ(Get(meta, kTestNS, "People[3]/ovt:Name"), "third");
+  XMP_OptionBits options = 0;
+  meta.GetArrayItem(kTestNS, "People", 3, nullptr, &options);
+  EXPECT_TRUE(options & kXMP_PropValueIsStruct);
+  EXPECT_THROW(meta.SetArrayItem(kTestNS, "People", 1, "text", kXMP_PropValueIsStruct), XMP_Error);
+}
+
 TEST_F(XMPProperties, LargeArrayCountIsExact) {
   XMPMeta meta;
   for (int i = 0; i < 37; ++i) meta.AppendArrayItem(kTestNS, "Bag", kXMP_PropValueIsArray, std::to_string(i));

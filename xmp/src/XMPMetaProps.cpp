@@ -315,8 +315,19 @@ void XMPMeta::SetArrayItem(const std::string& ns, const std::string& arrayName, 
   const XMP_Index position = index == kXMP_ArrayLastItem ? count : index;
   if (position < 1 || position > count + 1 || (position == count + 1 && (options & kXMP_InsertAfterItem)))
     detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(index));
-  if (!xmp_set_array_item(xmp, ns.c_str(), arrayName.c_str(), position, value.c_str(), WithImpliedBits(options)))
+  options = WithImpliedBits(options);
+  const XMP_OptionBits composite = options & kXMP_PropCompositeMask;
+  if (composite && !value.empty()) detail::Throw(kXMPErr_BadXPath, "composite array items have no value");
+  // The toolkit places only simple items; a composite one is placed empty,
+  // then given its form.
+  if (!xmp_set_array_item(xmp, ns.c_str(), arrayName.c_str(), position, value.c_str(), options & ~composite))
     Fail("writing an item of", ns, arrayName);
+  if (composite) {
+    const XMP_Index placed = (options & kXMP_InsertAfterItem) ? position + 1 : position;
+    const std::string item = arrayName + "[" + std::to_string(placed) + "]";
+    if (!xmp_set_property(xmp, ns.c_str(), item.c_str(), "", composite | kXMP_DeleteExisting))
+      Fail("writing an item of", ns, arrayName);
+  }
 }
 
 void XMPMeta::AppendArrayItem(const std::string& ns, const std::string& arrayName, XMP_OptionBits arrayOptions,
