@@ -14,13 +14,7 @@
 #include <nlohmann/json.hpp>
 #include <unistd.h>
 
-#include <ovrametadata/Definitions.h>
-#include <ovrametadata/Initialize.h>
-#include <ovrametadata/MetadataUtils.h>
-#include <ovrametadata/Paths.h>
-#include <ovrametadata/Providers.h>
-#include <ovrametadata/ValueEditing.h>
-#include <ovrametadata/Values.h>
+#include <ovrametadata/ovrametadata.h>
 
 #include "Names.h"
 #include "Progress.h"

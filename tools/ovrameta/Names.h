@@ -6,8 +6,7 @@
 #include <string>
 #include <vector>
 
-#include <ovrametadata/Definitions.h>
-#include <ovrametadata/Paths.h>
+#include <ovrametadata/ovrametadata.h>
 
 namespace ovrameta {
 

@@ -4,11 +4,7 @@
 
 #include <boost/make_shared.hpp>
 
-#include <ovrametadata/Format.h>
-#include <ovrametadata/Initialize.h>
-#include <ovrametadata/Providers.h>
-#include <ovrametadata/ValueEditing.h>
-#include <ovrametadata/Values.h>
+#include <ovrametadata/ovrametadata.h>
 
 #include "Names.h"
 #include "TextUtil.h"

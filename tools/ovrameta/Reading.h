@@ -8,9 +8,7 @@
 #include <boost/optional.hpp>
 #include <boost/shared_ptr.hpp>
 
-#include <ovrametadata/Definitions.h>
-#include <ovrametadata/Paths.h>
-#include <ovrametadata/Providers.h>
+#include <ovrametadata/ovrametadata.h>
 
 namespace ovrameta {
 

@@ -4,7 +4,7 @@
 
 #include <string>
 
-#include <ovrametadata/Common.h>
+#include <ovrametadata/ovrametadata.h>
 
 namespace ovrameta {
 

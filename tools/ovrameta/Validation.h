@@ -4,8 +4,7 @@
 
 #include <string>
 
-#include <ovrametadata/Definitions.h>
-#include <ovrametadata/Paths.h>
+#include <ovrametadata/ovrametadata.h>
 
 namespace ovrameta {
 
