@@ -232,17 +232,6 @@ TEST(FileProvider, ResetFilePathReloadsOnlyForAnotherPath) {
   EXPECT_EQ((*counter.handles)[1], nullptr);
 }
 
-TEST(FileProvider, ReloadSeesChangesMadeByAnotherWriter) {
-  ovratest::TempDir dir;
-  const fs::path file =
-      ovratest::MakeMediaFile(dir.path(), "shared", MediaKind::WAV, "<pt:Title>one</pt:Title>");
-  auto provider = ovratest::OpenFile(file);
-  ovratest::PutXMPIntoFile(file, ovratest::Packet("<pt:Title>two</pt:Title>"));
-  EXPECT_EQ(ovratest::Text(provider->MetaDataAccess(), ovratest::TestPath("Title")), "one");
-  provider->ReloadFile();
-  EXPECT_EQ(ovratest::Text(provider->MetaDataAccess(), ovratest::TestPath("Title")), "two");
-}
-
 TEST(FileProvider, ValueWrittenByExifToolIsRead) {
   if (!ovratest::media::HaveExifTool()) GTEST_SKIP() << "exiftool is not installed";
   ovratest::TempDir dir;
