@@ -107,10 +107,11 @@ bool RegisterTypeDefinition(TypeDefinitionPtr const& type, UTF16String const& so
         {type->name}, source);
   }
   for (auto const& field : type->fields) {
-    FixupPropertyOrFieldDefinition(field->prefix, field, source);
+    if (field) FixupPropertyOrFieldDefinition(field->prefix, field, source);
   }
   bool allRegistered = true;
   for (auto const& field : type->fields) {
+    if (!field) continue;
     if (!RegisterNamespaceWithToolkit(field->namespaceURI, field->prefix)) {
       ReportNamespaceRegistration(field->namespaceURI, field->prefix, source);
       allRegistered = false;
@@ -137,7 +138,7 @@ bool RegisterSchemaDefinition(SchemaDefinitionPtr const& schema, UTF16String con
       ReportNamespaceRegistration(schema->namespaceURI, schema->prefix, source);
     }
     for (auto const& property : schema->properties) {
-      FixupPropertyOrFieldDefinition(schema->prefix, property, source);
+      if (property) FixupPropertyOrFieldDefinition(schema->prefix, property, source);
     }
     return true;
   }

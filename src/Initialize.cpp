@@ -8,6 +8,7 @@
 
 #include "DefinitionsRegistryInternal.h"
 #include "InitializeInternal.h"
+#include "format/FormatInternal.h"
 
 namespace ovrametadata {
 
@@ -100,10 +101,8 @@ void Initialize() {
   LoadDefinitionsDirectory(CustomDefinitionsGlobalDirectory(), &IsSchemaExcludedFromGlobal);
   LoadDefinitionsDirectory(CustomDefinitionsUserDirectory(), {});
 
-  // Place of the formatting subsystem's start-up: the built-in value
-  // formatters, fallback paths and value aggregators are registered here on
-  // their EXIF, auxiliary-EXIF, TIFF and aggregate-namespace paths once
-  // that subsystem exists.
+  // Their paths are built from the definitions, so they come last.
+  RegisterBuiltInFormatters();
 
   ovracore::LogTimeMark(kStartupTimeCategory, "Finish Initializing ovrametadata");
 }
@@ -119,9 +118,9 @@ void Terminate() {
   // Place of the extension packages' shutdown: the common extension
   // packages are cleared here, before the error list.
   ClearErrorList();
-  // Place of the formatting and view subsystems' shutdown: the formatter,
-  // fallback-path and value-aggregator maps, then the common view
-  // definitions and their load count, are cleared here.
+  ClearFormatterTables();
+  // Place of the view subsystem's shutdown: the common view definitions and
+  // their load count are cleared here, before the definitions.
   ClearDefinitionsRegistry();
 
   ovraxmp::XMPFiles::Terminate();
