@@ -1,6 +1,7 @@
 // Helpers of the toolkit-layer tests.
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 #include <ovraxmp/XMPToolkit.h>
@@ -30,6 +31,17 @@ inline std::string Serialize(const ovraxmp::XMPMeta& meta) {
   std::string out;
   meta.SerializeToBuffer(&out, ovraxmp::kXMP_OmitPacketWrapper);
   return out;
+}
+
+// The id of the XMP_Error that call raises, 0 when it raises none.
+template <typename Call>
+std::int32_t ErrorIdOf(Call&& call) {
+  try {
+    call();
+  } catch (const ovraxmp::XMP_Error& e) {
+    return e.GetID();
+  }
+  return 0;
 }
 
 inline std::string Get(const ovraxmp::XMPMeta& meta, const std::string& ns, const std::string& path) {

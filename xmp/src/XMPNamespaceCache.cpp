@@ -15,7 +15,9 @@ namespace {
 std::shared_mutex sCacheMutex;
 std::unordered_map<std::string, std::string> sPrefixes;  // URI -> prefix with colon
 
-bool Lookup(const std::string& namespaceURI, std::string* prefix) {
+}  // namespace
+
+bool LookupPrefix(const std::string& namespaceURI, std::string* prefix) {
   {
     std::shared_lock<std::shared_mutex> lock(sCacheMutex);
     const auto found = sPrefixes.find(namespaceURI);
@@ -35,13 +37,11 @@ bool Lookup(const std::string& namespaceURI, std::string* prefix) {
   return true;
 }
 
-}  // namespace
-
-bool NamespaceKnown(const std::string& namespaceURI) { return Lookup(namespaceURI, nullptr); }
+bool NamespaceKnown(const std::string& namespaceURI) { return LookupPrefix(namespaceURI, nullptr); }
 
 std::string RequirePrefix(const std::string& namespaceURI) {
   std::string prefix;
-  if (!Lookup(namespaceURI, &prefix)) Throw(kXMPErr_BadSchema, "namespace \"" + namespaceURI + "\"");
+  if (!LookupPrefix(namespaceURI, &prefix)) Throw(kXMPErr_BadSchema, "namespace \"" + namespaceURI + "\"");
   return prefix;
 }
 
@@ -56,7 +56,7 @@ std::string NormalizedPath(const std::string& schemaNS, const std::string& path)
   const auto stop = path.find_first_of("/[");
   if (stop != std::string::npos && stop < colon) return path;
   std::string prefix;
-  if (Lookup(schemaNS, &prefix) && path.compare(0, prefix.size(), prefix) == 0)
+  if (LookupPrefix(schemaNS, &prefix) && path.compare(0, prefix.size(), prefix) == 0)
     return path.substr(prefix.size());
   return path;
 }

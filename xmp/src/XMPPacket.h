@@ -77,6 +77,8 @@ XMPPacket* NewPacket(XmpPtr xmp);
 // True when the namespace is registered with the toolkit. Positive answers
 // are cached: registrations are never undone while the toolkit runs.
 bool NamespaceKnown(const std::string& namespaceURI);
+// The prefix with colon into *prefix (when non-null); false when unregistered.
+bool LookupPrefix(const std::string& namespaceURI, std::string* prefix);
 // The registered prefix with colon; throws kXMPErr_BadSchema when none.
 std::string RequirePrefix(const std::string& namespaceURI);
 // Forgets the cache (the toolkit stopped).

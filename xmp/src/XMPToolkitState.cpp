@@ -111,12 +111,7 @@ bool XMPMeta::RegisterNamespace(const std::string& namespaceURI,
 }
 
 bool XMPMeta::GetNamespacePrefix(const std::string& namespaceURI, std::string* prefix) {
-  detail::EnsureStarted();
-  if (namespaceURI.empty()) return false;
-  detail::XmpString found;
-  if (!xmp_namespace_prefix(namespaceURI.c_str(), found)) return false;
-  if (prefix) *prefix = found.str();
-  return true;
+  return detail::LookupPrefix(namespaceURI, prefix);
 }
 
 bool XMPMeta::GetNamespaceURI(const std::string& prefix, std::string* namespaceURI) {
