@@ -1,6 +1,5 @@
 #include <ovracore/Localizer.h>
 
-#include "DefinitionsParser.h"
 #include "SrcTestSupport.h"
 #include "TestSupport.h"
 
@@ -235,23 +234,6 @@ TEST(DefinitionsParser, DocumentsAreReadFromFiles) {
   ASSERT_EQ(errors.size(), 1u);
   ExpectError(errors[0], kDefinitionParsingError, "Error parsing definitions file: invalid XML.",
               missing);
-}
-
-TEST(DefinitionsParser, DirectHandlerUseIgnoresEndElements) {
-  // The handler itself, without the entry points: closing elements changes
-  // nothing about what is current.
-  DefinitionsPair result;
-  DefinitionsParser handler(result, kSource);
-  ovracore::Attributes schema;
-  schema.Add("", "namespace", "http://example.com/direct/");
-  schema.Add("", "prefix", "d");
-  handler.StartElementNoNamespace("xmp_schema", schema);
-  handler.EndElementNoNamespace("xmp_schema");
-  ovracore::Attributes property;
-  property.Add("", "name", "p");
-  handler.StartElement("", "xmp_property", property);
-  ASSERT_EQ(result.first.size(), 1u);
-  EXPECT_EQ(result.first[0]->properties.size(), 1u);
 }
 
 class ParseAndRegister : public ::testing::Test {
