@@ -3,6 +3,7 @@
 // and node kind first, because the toolkit reports its failures on stderr.
 #include <string>
 
+#include <ovracore/SAXParser.h>
 #include <ovraxmp/XMPMeta.h>
 #include <ovraxmp/XMPUtils.h>
 
@@ -52,6 +53,19 @@ void CheckIndex(XMP_Index index) {
   if (index == 0 || index < kXMP_ArrayLastItem) detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(index));
 }
 
+// The toolkit's RDF reader recurses per element and overflows the stack on
+// absurdly nested input; such documents (and malformed ones, which it would
+// refuse anyway, after complaining on stderr) are turned away first.
+void RequireSaneXML(const char* buffer, std::size_t length) {
+  while (length > 0 && buffer[length - 1] == '\0') --length;  // padding the toolkit tolerates
+  struct ScanOnly : ovracore::AbstractParseHandler {
+  } handler;
+  ovracore::ParserLimits limits;
+  limits.maxDepth = 256;
+  const auto parser = ovracore::GetParserWithNamespaceSupport(handler, limits);
+  if (!parser->ParseBuffer(buffer, length)) detail::Throw(kXMPErr_BadXML, "parsing XMP: " + parser->ErrorMessage());
+}
+
 // A bare rdf:RDF (no x:xmpmeta around it) gets the wrapper the toolkit wants.
 std::string WrapBareRDF(const char* buffer, std::size_t length) {
   const std::string text(buffer, length);
@@ -94,13 +108,20 @@ void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_Option
   bool ok = true;
   if (buffer && length > 0) {
     const std::string_view view(buffer, length);
+    std::string wrapped;
     if (!(options & kXMP_RequireXMPMeta) && view.find("xmpmeta") == std::string_view::npos &&
         view.find("rdf:RDF") != std::string_view::npos) {
-      const std::string wrapped = WrapBareRDF(buffer, length);
-      ok = xmp_parse(fresh, wrapped.data(), wrapped.size());
-    } else {
-      ok = xmp_parse(fresh, buffer, length);
+      wrapped = WrapBareRDF(buffer, length);
+      buffer = wrapped.data();
+      length = wrapped.size();
     }
+    try {
+      RequireSaneXML(buffer, length);
+    } catch (...) {
+      xmp_free(fresh);
+      throw;
+    }
+    ok = xmp_parse(fresh, buffer, length);
   }
   if (!ok) {
     const int id = xmp_get_error();
