@@ -1,9 +1,11 @@
 // Packet content: parse, serialise, and the property, array, field,
 // qualifier and localised-text operations. Every call tests registration
 // and node kind first, because the toolkit reports its failures on stderr.
+#include <algorithm>
 #include <string>
 
-#include <ovracore/SAXParser.h>
+#include <expat.h>
+
 #include <ovraxmp/XMPMeta.h>
 #include <ovraxmp/XMPUtils.h>
 
@@ -55,15 +57,44 @@ void CheckIndex(XMP_Index index) {
 
 // The toolkit's RDF reader recurses per element and overflows the stack on
 // absurdly nested input; such documents (and malformed ones, which it would
-// refuse anyway, after complaining on stderr) are turned away first.
+// refuse anyway, after complaining on stderr) are turned away first by a
+// bare expat pass that only counts depth.
+struct DepthScan {
+  XML_Parser parser = nullptr;
+  int depth = 0;
+  std::string problem;
+
+  static void Stop(DepthScan& self, const char* why) {
+    if (self.problem.empty()) self.problem = why;
+    XML_StopParser(self.parser, XML_FALSE);
+  }
+  static void XMLCALL Start(void* data, const XML_Char*, const XML_Char**) {
+    auto& self = *static_cast<DepthScan*>(data);
+    if (++self.depth > 256) Stop(self, "elements nested too deeply");
+  }
+  static void XMLCALL End(void* data, const XML_Char*) { --static_cast<DepthScan*>(data)->depth; }
+  static void XMLCALL Doctype(void* data, const XML_Char*, const XML_Char*, const XML_Char*, int) {
+    Stop(*static_cast<DepthScan*>(data), "DOCTYPE is not allowed");
+  }
+};
+
 void RequireSaneXML(const char* buffer, std::size_t length) {
   while (length > 0 && buffer[length - 1] == '\0') --length;  // padding the toolkit tolerates
-  struct ScanOnly : ovracore::AbstractParseHandler {
-  } handler;
-  ovracore::ParserLimits limits;
-  limits.maxDepth = 256;
-  const auto parser = ovracore::GetParserWithNamespaceSupport(handler, limits);
-  if (!parser->ParseBuffer(buffer, length)) detail::Throw(kXMPErr_BadXML, "parsing XMP: " + parser->ErrorMessage());
+  DepthScan scan;
+  scan.parser = XML_ParserCreate(nullptr);
+  if (!scan.parser) detail::Throw(kXMPErr_NoMemory, "parsing XMP");
+  XML_SetUserData(scan.parser, &scan);
+  XML_SetElementHandler(scan.parser, &DepthScan::Start, &DepthScan::End);
+  XML_SetStartDoctypeDeclHandler(scan.parser, &DepthScan::Doctype);
+  bool ok = true;
+  const std::size_t chunk = 1u << 30;
+  for (std::size_t done = 0; ok && done < length; done += chunk) {
+    const std::size_t part = std::min(chunk, length - done);
+    ok = XML_Parse(scan.parser, buffer + done, static_cast<int>(part), done + part == length) == XML_STATUS_OK;
+  }
+  if (!ok && scan.problem.empty()) scan.problem = XML_ErrorString(XML_GetErrorCode(scan.parser));
+  XML_ParserFree(scan.parser);
+  if (!ok) detail::Throw(kXMPErr_BadXML, "parsing XMP: " + scan.problem);
 }
 
 // A bare rdf:RDF (no x:xmpmeta around it) gets the wrapper the toolkit wants.
