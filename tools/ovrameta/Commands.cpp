@@ -370,6 +370,7 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
   ReadOptions readOptions;
   readOptions.raw = options.raw || options.json;
   readOptions.items = options.json;
+  readOptions.types = options.json;
   const bool bare = files.size() == 1 && names.size() == 1 && !options.json;
   Json output = Json::array();
   Progress progress(files.size(), "files read");

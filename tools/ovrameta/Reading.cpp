@@ -59,9 +59,9 @@ void ForEachItem(XMPMetaRef xmp, const Path& arrayPath, Visit visit) {
 }
 
 void Describe(const EntryDefinition& entry, const boost::optional<PrimitiveType>& primitive,
-              ValueNode& node) {
+              bool types, ValueNode& node) {
   node.label = LabelOr(entry.label, entry.name);
-  node.typeText = TypeText(entry);
+  if (types) node.typeText = TypeText(entry);
   node.primitive = primitive ? PrimitiveTypeAsPrimitiveTypeId(*primitive) : std::string();
 }
 
@@ -69,13 +69,13 @@ void Describe(const EntryDefinition& entry, const boost::optional<PrimitiveType>
 // for the constructed value directly spares resolving the definition of
 // every absent property.
 bool ReadConstructedValue(XMPMetaRef xmp, const Path& path, const std::string& name,
-                          const EntryDefinition& entry, ValueNode& out) {
+                          const EntryDefinition& entry, bool types, ValueNode& out) {
   UTF8String constructed;
   GetValueResult result = ValueAbsent;
   if (!path.internal || !GetConstructedValue(xmp, path, constructed, &result)) return false;
   ValueNode node;
   node.name = name;
-  Describe(entry, PrimitiveTypeOfEntry(entry), node);
+  Describe(entry, PrimitiveTypeOfEntry(entry), types, node);
   node.value = DisplayText(entry, constructed);
   out = std::move(node);
   return true;
@@ -90,14 +90,14 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
   if (!HasValue(xmp, path)) {
     if (!path.internal) return false;
     if (!entry) entry = PathEntryDefinition(path);
-    return entry && ReadConstructedValue(xmp, path, name, *entry, out);
+    return entry && ReadConstructedValue(xmp, path, name, *entry, options.types, out);
   }
   if (!entry) entry = PathEntryDefinition(path);
   if (!entry) return false;
   const auto primitive = PrimitiveTypeOfEntry(*entry);
   ValueNode node;
   node.name = name;
-  Describe(*entry, primitive, node);
+  Describe(*entry, primitive, options.types, node);
 
   if (const auto structType = StructTypeOf(path, *entry)) {
     node.kind = ValueNode::kStruct;
@@ -255,7 +255,7 @@ std::vector<SchemaValues> ReadAllValues(const boost::shared_ptr<MetaDataProvider
         }
       } else if (property.path.internal &&
                  ReadConstructedValue(xmp, property.path, property.name, *property.property,
-                                      node)) {
+                                      options.types, node)) {
         values.values.push_back(std::move(node));
       }
     }

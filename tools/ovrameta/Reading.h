@@ -29,6 +29,7 @@ struct ValueNode {
 struct ReadOptions {
   bool raw = false;    // also read the stored text of every value
   bool items = true;   // read the items of arrays of simple values one by one
+  bool types = false;  // describe the type of every value (typeText)
 };
 
 // Reads the value at path, named name. False when nothing is stored there

@@ -9,6 +9,8 @@
 #include "Commands.h"
 
 int main(int argc, char** argv) {
+  // Output goes through std::cout only.
+  std::ios::sync_with_stdio(false);
   CLI::App app{"Shows and edits the XMP metadata of media files."};
   app.require_subcommand(1);
   app.footer(
