@@ -112,6 +112,13 @@ TEST_F(XMPProperties, SimpleGetSetDeleteExists) {
   meta.DeleteProperty(kTestNS, "Name");
   meta.DeleteProperty(kTestNS, "Name");
   EXPECT_FALSE(meta.DoesPropertyExist(kTestNS, "Name"));
+  // A text value on an array is refused quietly, unless the array goes.
+  meta.AppendArrayItem(kTestNS, "List", kXMP_PropValueIsArray, "item");
+  testing::internal::CaptureStderr();
+  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.SetProperty(kTestNS, "List", "text"); }), kXMPErr_BadXPath);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+  meta.SetProperty(kTestNS, "List", "text", kXMP_DeleteExisting);
+  EXPECT_EQ(Get(meta, kTestNS, "List"), "text");
   // Unregistered namespaces: reads answer false, writes raise bad-schema.
   EXPECT_FALSE(meta.GetProperty("http://ovra.test/unregistered/", "X", &value));
   EXPECT_FALSE(meta.DoesPropertyExist("http://ovra.test/unregistered/", "X"));

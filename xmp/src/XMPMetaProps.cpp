@@ -234,8 +234,12 @@ void XMPMeta::SetProperty(const std::string& ns, const std::string& name, const 
                           XMP_OptionBits options) {
   XmpPtr xmp = X(mRef);
   detail::RequirePrefix(ns);
-  if (!xmp_set_property(xmp, ns.c_str(), name.c_str(), value.c_str(), WithImpliedBits(options)))
-    Fail("writing", ns, name);
+  options = WithImpliedBits(options);
+  XMP_OptionBits existing = 0;
+  if (!(options & (kXMP_PropCompositeMask | kXMP_DeleteExisting)) && NodeOptions(xmp, ns, name, &existing) &&
+      (existing & kXMP_PropCompositeMask))
+    detail::Throw(kXMPErr_BadXPath, "\"" + name + "\" is a structure or array and has no value of its own");
+  if (!xmp_set_property(xmp, ns.c_str(), name.c_str(), value.c_str(), options)) Fail("writing", ns, name);
 }
 
 void XMPMeta::DeleteProperty(const std::string& ns, const std::string& name) {

@@ -143,6 +143,7 @@ constexpr const char kXMP_NS_XMP_ResourceEvent[] = "http://ns.adobe.com/xap/1.0/
 constexpr const char kXMP_NS_XMP_ResourceRef[] = "http://ns.adobe.com/xap/1.0/sType/ResourceRef#";
 // Data that lives only in memory: never serialised, never written to files.
 constexpr const char kXMP_NS_Transient[] = "http://ns.adobe.com/xmp/transient/1.0/";
+constexpr const char kXMP_NS_XMP_Transient[] = "http://ns.adobe.com/xmp/transient/1.0/";
 constexpr const char kXMP_NS_Transient_Prefix[] = "xmpx";
 
 // A date, a time or both, as XMP allows them. Fields that the flags say are

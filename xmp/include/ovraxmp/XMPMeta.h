@@ -61,7 +61,8 @@ class XMPMeta {
                    XMP_OptionBits* options = nullptr) const;
   // Creates or replaces the property; options with a composite bit create an
   // empty struct or array. Throws kXMPErr_BadSchema for an unregistered
-  // namespace.
+  // namespace and kXMPErr_BadXPath for a text value on an existing struct or
+  // array (unless kXMP_DeleteExisting replaces it).
   void SetProperty(const std::string& schemaNS, const std::string& propName,
                    const std::string& propValue, XMP_OptionBits options = 0);
   // Deleting an absent property does nothing.
