@@ -229,6 +229,9 @@ TEST_F(OvrametaTest, SetAndDeleteRoundTripOnEverySampleKind) {
 
 TEST_F(OvrametaTest, SetOnAFileWithoutMetadataCreatesIt) {
   WriteFile(mDir / "bare.jpg", ovratest::media::MinimalJPEG());
+  const Result empty = Run({"show", "bare.jpg"});
+  EXPECT_EQ(empty.status, 0);
+  EXPECT_EQ(empty.out, "(no metadata)\n");
   EXPECT_EQ(Run({"get", "bare.jpg", "dc:title"}).status, 1);
   ASSERT_EQ(Run({"set", "bare.jpg", "dc:title=First words"}).status, 0);
   EXPECT_EQ(Get("bare.jpg", "dc:title"), "First words");
@@ -339,6 +342,30 @@ TEST_F(OvrametaTest, SchemasListsPropertiesWithTypesAndStructureFields) {
   EXPECT_CONTAINS(dm.out, "seq of Marker (structure)");
   EXPECT_CONTAINS(dm.out, "xmpDM:good");
   EXPECT_EQ(Run({"schemas", "nope"}).status, 2);
+}
+
+TEST_F(OvrametaTest, ProgressBarRunsOnATerminalOnly) {
+  std::vector<std::string> arguments = {"get"};
+  for (int i = 0; i < 25; ++i) {
+    const std::string name = "f" + std::to_string(i) + ".jpg";
+    Sample("harbour.jpg", name);
+    arguments.push_back(name);
+  }
+  arguments.push_back("dc:title");
+  const Result piped = Run(arguments);
+  ASSERT_EQ(piped.status, 0) << piped.err;
+  EXPECT_EQ(piped.err.find("files read"), std::string::npos);
+
+  if (std::system("script --version >/dev/null 2>&1") != 0) {
+    GTEST_SKIP() << "script(1) is missing; the terminal case is not checked";
+  }
+  // script(1) gives the program a terminal for its output and error.
+  std::string command = Quote(OVRAMETA_EXE);
+  for (const auto& argument : arguments) command += " " + Quote(argument);
+  const std::string terminal = RunCommand("cd " + Quote(mDir.path().string()) +
+                                          " && script -qec " + Quote(command) + " /dev/null");
+  EXPECT_CONTAINS(terminal, "25/25 files read");
+  EXPECT_CONTAINS(terminal, "f9.jpg: dc:title = Harbour at dawn");
 }
 
 // ---------------------------------------------------------------------------
