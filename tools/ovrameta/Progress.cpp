@@ -1,6 +1,7 @@
 #include "Progress.h"
 
 #include <cstdio>
+#include <iostream>
 
 #include <sys/ioctl.h>
 #include <unistd.h>
@@ -35,6 +36,8 @@ void Progress::Step() {
 }
 
 void Progress::Draw() {
+  // Results written since the last Clear go out first, on their own lines.
+  std::cout.flush();
   const std::string counter =
       " " + std::to_string(mDone) + "/" + std::to_string(mTotal) + " " + mWhat;
   int width = TerminalWidth() - static_cast<int>(counter.size()) - 3;
