@@ -335,6 +335,26 @@ TEST_F(XMPProperties, MultiValueMarksCoverDescendantsAndClearBelow) {
   EXPECT_FALSE(meta.IsMultiValued(kTestNS, "Placement"));
 }
 
+TEST_F(XMPProperties, PathsIntoNodesOfTheWrongKindFailQuietly) {
+  XMPMeta meta = xmptest::Parse(xmptest::RealWorldPacket());
+  std::string value;
+  testing::internal::CaptureStderr();
+  // Rating is simple, creator an array, DerivedFrom a structure.
+  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.GetProperty(kXMP_NS_XMP, "Rating/xmp:Sub", &value); }), kXMPErr_BadXPath);
+  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.DoesPropertyExist(kXMP_NS_XMP, "Rating[1]"); }), kXMPErr_BadXPath);
+  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.DeleteProperty(kXMP_NS_DC, "creator/dc:x"); }), kXMPErr_BadXPath);
+  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.SetProperty(kXMP_NS_XMP_MM, "DerivedFrom[1]", "v"); }), kXMPErr_BadXPath);
+  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.SetProperty(kXMP_NS_DC, "missing[1]", "v"); }), kXMPErr_BadXPath);
+  // Missing ancestors read as absent; a qualifier may sit on any node.
+  EXPECT_FALSE(meta.GetProperty(kXMP_NS_XMP, "Missing/xmp:Sub[2]/?xmp:Q", &value));
+  EXPECT_FALSE(meta.DoesPropertyExist(kXMP_NS_DC, "creator[7]/?xmp:Q"));
+  EXPECT_FALSE(meta.GetProperty(kXMP_NS_XMP, "Rating/?xmp:Q", &value));
+  meta.DeleteProperty(kXMP_NS_XMP, "Missing/xmp:Sub");
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+  meta.SetProperty(kXMP_NS_XMP, "NewStruct/xmp:Field", "created");  // implicit structure
+  EXPECT_EQ(Get(meta, kXMP_NS_XMP, "NewStruct/xmp:Field"), "created");
+}
+
 TEST_F(XMPProperties, OrdinaryOperationsPrintNothingOnStderr) {
   testing::internal::CaptureStderr();
   {

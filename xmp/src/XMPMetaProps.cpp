@@ -22,9 +22,7 @@ XmpPtr X(XMPMetaRef ref) { return detail::Require(ref).Xmp(); }
   detail::ThrowLastError(kXMPErr_InternalFailure, what + " \"" + path + "\" in \"" + ns + "\"");
 }
 
-// Options of an existing node; false when absent or its namespace unknown.
-bool NodeOptions(XmpPtr xmp, const std::string& ns, const std::string& path, XMP_OptionBits* options) {
-  if (!detail::NamespaceKnown(ns)) return false;
+bool RawOptions(XmpPtr xmp, const std::string& ns, const std::string& path, XMP_OptionBits* options) {
   std::uint32_t bits = 0;
   if (!xmp_get_property(xmp, ns.c_str(), path.c_str(), nullptr, &bits)) {
     if (xmp_get_error() != 0) Fail("reading", ns, path);
@@ -32,6 +30,41 @@ bool NodeOptions(XmpPtr xmp, const std::string& ns, const std::string& path, XMP
   }
   *options = bits;
   return true;
+}
+
+// The toolkit complains on stderr when a path steps into a node of the
+// wrong kind (a field of a simple value, an item of a structure), which
+// real files with unexpected shapes make ordinary. So the ancestors of a
+// composite path are checked first: a wrong kind raises kXMPErr_BadXPath
+// here; a missing ancestor is reported through *missingStep (the character
+// of the step below it), or 0 when every ancestor exists.
+void CheckAncestors(XmpPtr xmp, const std::string& ns, const std::string& path, char* missingStep) {
+  *missingStep = 0;
+  if (path.find_first_of("/[") == std::string::npos) return;
+  detail::ForEachAncestor(path, [&](std::size_t end) {
+    XMP_OptionBits options = 0;
+    const std::string ancestor = path.substr(0, end);
+    if (!RawOptions(xmp, ns, ancestor, &options)) {
+      *missingStep = path[end];
+      return true;
+    }
+    const bool item = path[end] == '[';
+    const bool qualifier = path[end] == '/' && end + 1 < path.size() && path[end + 1] == '?';
+    if (item && !(options & kXMP_PropValueIsArray))
+      detail::Throw(kXMPErr_BadXPath, "\"" + ancestor + "\" is not an array");
+    if (!item && !qualifier && !(options & kXMP_PropValueIsStruct))
+      detail::Throw(kXMPErr_BadXPath, "\"" + ancestor + "\" is not a structure");
+    return false;
+  });
+}
+
+// Options of an existing node; false when absent or its namespace unknown.
+bool NodeOptions(XmpPtr xmp, const std::string& ns, const std::string& path, XMP_OptionBits* options) {
+  if (!detail::NamespaceKnown(ns)) return false;
+  char missing = 0;
+  CheckAncestors(xmp, ns, path, &missing);
+  if (missing) return false;
+  return RawOptions(xmp, ns, path, options);
 }
 
 void RequireArray(XmpPtr xmp, const std::string& ns, const std::string& arrayName, bool* exists,
@@ -219,6 +252,9 @@ bool XMPMeta::GetProperty(const std::string& ns, const std::string& name, std::s
                           XMP_OptionBits* options) const {
   XmpPtr xmp = X(mRef);
   if (!detail::NamespaceKnown(ns)) return false;
+  char missing = 0;
+  CheckAncestors(xmp, ns, name, &missing);
+  if (missing) return false;
   XmpString text;
   std::uint32_t bits = 0;
   if (!xmp_get_property(xmp, ns.c_str(), name.c_str(), text, &bits)) {
@@ -236,7 +272,10 @@ void XMPMeta::SetProperty(const std::string& ns, const std::string& name, const 
   detail::RequirePrefix(ns);
   options = WithImpliedBits(options);
   XMP_OptionBits existing = 0;
-  if (!(options & (kXMP_PropCompositeMask | kXMP_DeleteExisting)) && NodeOptions(xmp, ns, name, &existing) &&
+  char missing = 0;
+  CheckAncestors(xmp, ns, name, &missing);
+  if (missing == '[') detail::Throw(kXMPErr_BadXPath, "the array of \"" + name + "\" does not exist");
+  if (!(options & (kXMP_PropCompositeMask | kXMP_DeleteExisting)) && RawOptions(xmp, ns, name, &existing) &&
       (existing & kXMP_PropCompositeMask))
     detail::Throw(kXMPErr_BadXPath, "\"" + name + "\" is a structure or array and has no value of its own");
   if (!xmp_set_property(xmp, ns.c_str(), name.c_str(), value.c_str(), options)) Fail("writing", ns, name);
@@ -245,12 +284,18 @@ void XMPMeta::SetProperty(const std::string& ns, const std::string& name, const 
 void XMPMeta::DeleteProperty(const std::string& ns, const std::string& name) {
   XmpPtr xmp = X(mRef);
   if (!detail::NamespaceKnown(ns)) return;
+  char missing = 0;
+  CheckAncestors(xmp, ns, name, &missing);
+  if (missing) return;
   if (!xmp_delete_property(xmp, ns.c_str(), name.c_str())) Fail("deleting", ns, name);
 }
 
 bool XMPMeta::DoesPropertyExist(const std::string& ns, const std::string& name) const {
   XmpPtr xmp = X(mRef);
   if (!detail::NamespaceKnown(ns)) return false;
+  char missing = 0;
+  CheckAncestors(xmp, ns, name, &missing);
+  if (missing) return false;
   if (xmp_has_property(xmp, ns.c_str(), name.c_str())) return true;
   if (xmp_get_error() != 0) Fail("testing", ns, name);
   return false;

@@ -88,6 +88,30 @@ void ForgetNamespaces();
 // "dc:title" and "title" name the same node in the multi-value marks.
 std::string NormalizedPath(const std::string& schemaNS, const std::string& path);
 
+// Calls visit(end) with the end of every ancestor of path, outermost first
+// (the positions of '/' and '[' outside of brackets and quotes); stops when
+// visit answers true.
+template <typename Visit>
+void ForEachAncestor(const std::string& path, Visit visit) {
+  int depth = 0;
+  bool quoted = false;
+  for (std::size_t i = 0; i < path.size(); ++i) {
+    const char c = path[i];
+    if (quoted) {
+      if (c == '"') quoted = false;
+      continue;
+    }
+    if (c == '"') {
+      quoted = true;
+    } else if (c == ']') {
+      --depth;
+    } else if (c == '[' || c == '/') {
+      if (depth == 0 && i > 0 && visit(i)) return;
+      if (c == '[') ++depth;
+    }
+  }
+}
+
 // A deep copy of a toolkit object (the toolkit's own copy shares the tree).
 XmpPtr DeepCopy(XmpPtr xmp);
 

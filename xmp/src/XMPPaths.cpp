@@ -13,29 +13,6 @@ void RequireName(const std::string& name, const char* what) {
   if (name.empty()) detail::Throw(kXMPErr_BadXPath, std::string("empty ") + what);
 }
 
-// The path ends of every ancestor of path (positions of '/' and '[' outside
-// of brackets and quotes).
-template <typename Visit>
-void ForEachAncestor(const std::string& path, Visit visit) {
-  int depth = 0;
-  bool quoted = false;
-  for (std::size_t i = 0; i < path.size(); ++i) {
-    const char c = path[i];
-    if (quoted) {
-      if (c == '"') quoted = false;
-      continue;
-    }
-    if (c == '"') quoted = true;
-    else if (c == ']') --depth;
-    else if (depth == 0 && (c == '/' || c == '[')) {
-      if (i > 0 && visit(i)) return;
-      if (c == '[') ++depth;
-    } else if (c == '[') {
-      ++depth;
-    }
-  }
-}
-
 }  // namespace
 
 void XMPUtils::ComposeArrayItemPath(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex,
@@ -89,7 +66,7 @@ bool XMPMeta::IsMultiValued(const std::string& ns, const std::string& path) cons
   const std::string normal = detail::NormalizedPath(ns, path);
   if (marks.count(normal)) return true;
   bool hit = false;
-  ForEachAncestor(normal, [&](std::size_t end) {
+  detail::ForEachAncestor(normal, [&](std::size_t end) {
     hit = marks.count(normal.substr(0, end)) > 0;
     return hit;
   });
