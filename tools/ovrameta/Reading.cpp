@@ -169,6 +169,12 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
   }
   if (!found) return false;
   node.value = DisplayText(*entry, text);
+  // The library formats internal properties itself; dates, rationals and GPS
+  // coordinates of editorial properties are formatted here for display.
+  if (!path.internal && node.value == text) {
+    const UTF8String formatted = FormatValue(xmp, path, text);
+    if (!formatted.empty()) node.value = formatted;
+  }
   if (options.raw) node.raw = ReadStoredText(xmp, path);
   out = std::move(node);
   return true;
