@@ -5,7 +5,8 @@ if(rc)
   message(FATAL_ERROR "install failed")
 endif()
 execute_process(COMMAND ${CMAKE_COMMAND} -S ${SOURCE} -B ${STAGE}/build -G ${GENERATOR}
-  -DCMAKE_PREFIX_PATH=${STAGE}/usr RESULT_VARIABLE rc)
+  -DCMAKE_PREFIX_PATH=${STAGE}/usr "-DCMAKE_CXX_FLAGS=${EXTRA_FLAGS}"
+  "-DCMAKE_EXE_LINKER_FLAGS=${EXTRA_FLAGS}" RESULT_VARIABLE rc)
 if(rc)
   message(FATAL_ERROR "configuring the consumer failed")
 endif()
