@@ -250,8 +250,9 @@ void XMPMeta::Erase() {
 
 bool XMPMeta::GetProperty(const std::string& ns, const std::string& name, std::string* value,
                           XMP_OptionBits* options) const {
-  XmpPtr xmp = X(mRef);
-  if (!detail::NamespaceKnown(ns)) return false;
+  XMPPacket& packet = detail::Require(mRef);
+  XmpPtr xmp = packet.Xmp();
+  if (!detail::NamespaceKnown(packet, ns)) return false;
   char missing = 0;
   CheckAncestors(xmp, ns, name, &missing);
   if (missing) return false;
@@ -261,7 +262,7 @@ bool XMPMeta::GetProperty(const std::string& ns, const std::string& name, std::s
     if (xmp_get_error() != 0) Fail("reading", ns, name);
     return false;
   }
-  if (value) *value = text.str();
+  if (value) value->assign(xmp_string_cstr(text), xmp_string_len(text));
   if (options) *options = bits;
   return true;
 }

@@ -1,5 +1,6 @@
 // The cache of registered namespaces that lets the layer test registration
 // before calling the toolkit (which complains on stderr about unknown ones).
+#include <atomic>
 #include <mutex>
 #include <shared_mutex>
 #include <string>
@@ -14,6 +15,8 @@ namespace {
 
 std::shared_mutex sCacheMutex;
 std::unordered_map<std::string, std::string> sPrefixes;  // URI -> prefix with colon
+// Bumped whenever the cache is emptied, so that per-thread shortcuts expire.
+std::atomic<unsigned> sGeneration{0};
 
 }  // namespace
 
@@ -39,6 +42,15 @@ bool LookupPrefix(const std::string& namespaceURI, std::string* prefix) {
 
 bool NamespaceKnown(const std::string& namespaceURI) { return LookupPrefix(namespaceURI, nullptr); }
 
+bool NamespaceKnown(XMPPacket& packet, const std::string& namespaceURI) {
+  const unsigned generation = sGeneration.load(std::memory_order_acquire);
+  if (packet.mKnownGeneration == generation && packet.mKnownNS == namespaceURI) return true;
+  if (!LookupPrefix(namespaceURI, nullptr)) return false;
+  packet.mKnownGeneration = generation;
+  packet.mKnownNS = namespaceURI;
+  return true;
+}
+
 std::string RequirePrefix(const std::string& namespaceURI) {
   std::string prefix;
   if (!LookupPrefix(namespaceURI, &prefix)) Throw(kXMPErr_BadSchema, "namespace \"" + namespaceURI + "\"");
@@ -48,6 +60,7 @@ std::string RequirePrefix(const std::string& namespaceURI) {
 void ForgetNamespaces() {
   std::unique_lock<std::shared_mutex> lock(sCacheMutex);
   sPrefixes.clear();
+  sGeneration.fetch_add(1, std::memory_order_acq_rel);
 }
 
 std::string NormalizedPath(const std::string& schemaNS, const std::string& path) {

@@ -40,6 +40,11 @@ class XMPPacket {
   std::map<std::string, std::set<std::string>>& Marks() { return mMarks; }
   const std::map<std::string, std::set<std::string>>& Marks() const { return mMarks; }
 
+  // The namespace last found registered for this packet (reads repeat it);
+  // valid while its generation is the registry's.
+  std::string mKnownNS;
+  unsigned mKnownGeneration = ~0u;
+
  private:
   XmpPtr mXmp;
   std::atomic<std::int32_t> mRefCount{1};
@@ -77,6 +82,8 @@ XMPPacket* NewPacket(XmpPtr xmp);
 // True when the namespace is registered with the toolkit. Positive answers
 // are cached: registrations are never undone while the toolkit runs.
 bool NamespaceKnown(const std::string& namespaceURI);
+// The same, remembering the last positive answer in the packet.
+bool NamespaceKnown(XMPPacket& packet, const std::string& namespaceURI);
 // The prefix with colon into *prefix (when non-null); false when unregistered.
 bool LookupPrefix(const std::string& namespaceURI, std::string* prefix);
 // The registered prefix with colon; throws kXMPErr_BadSchema when none.
