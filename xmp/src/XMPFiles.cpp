@@ -12,6 +12,7 @@
 #include <ovraxmp/XMPUtils.h>
 
 #include "XMPPacket.h"
+#include "XMPScan.h"
 
 namespace ovraxmp {
 namespace {
@@ -25,6 +26,15 @@ fs::path PathOf(const std::string& utf8) { return fs::u8path(utf8); }
 bool IsRegularFile(const std::string& utf8) {
   std::error_code ec;
   return !utf8.empty() && fs::is_regular_file(PathOf(utf8), ec);
+}
+
+// The toolkit's file handlers mishandle relative paths with a folder part
+// ("c/x.jpg"): they only ever see absolute, normalised ones.
+std::string ToolkitPath(const std::string& utf8) {
+  std::error_code ec;
+  fs::path absolute = fs::absolute(PathOf(utf8), ec);
+  if (ec) return utf8;
+  return absolute.lexically_normal().u8string();
 }
 
 bool IsSidecarPath(const std::string& utf8) {
@@ -78,9 +88,29 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
     mHandlerFlags = kSidecarHandlerFlags;
   } else {
     if (format != kXMP_UnknownFile && format != XMPFiles::CheckFileFormat(filePath)) return false;
+    std::string problem;
+    if (!detail::MediaFileIsSane(filePath, &problem)) {
+      // The handlers would crash, hang or exhaust memory on this file, or
+      // silently replace XMP they could not read: it is never handed to
+      // them. Read, it answers its format and has no XMP; it is never
+      // opened for update.
+      if (forUpdate) return false;
+      mRefusal = problem;
+      mFile = nullptr;
+      mSidecar = false;
+      mFormat = XMPFiles::CheckFileFormat(filePath);
+      mHandlerFlags = 0;
+      if (mFormat != kXMP_UnknownFile) XMPFiles::GetFormatInfo(mFormat, &mHandlerFlags);
+      mOpen = true;
+      mPath = filePath;
+      mOpenFlags = openFlags;
+      mHasPending = false;
+      mPending.clear();
+      return true;
+    }
     XmpFilePtr file = xmp_files_new();
     if (!file) detail::ThrowLastError(kXMPErr_NoMemory, "creating a file object");
-    if (!xmp_files_open(file, filePath.c_str(), static_cast<XmpOpenFileOptions>(openFlags))) {
+    if (!xmp_files_open(file, ToolkitPath(filePath).c_str(), static_cast<XmpOpenFileOptions>(openFlags))) {
       xmp_files_free(file);
       return false;
     }
@@ -98,6 +128,7 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
     mFormat = type;
     mHandlerFlags = handler;
   }
+  mRefusal.clear();
   mOpen = true;
   mPath = filePath;
   mOpenFlags = openFlags;
@@ -117,8 +148,13 @@ void XMPFiles::CloseFile(XMP_OptionBits closeFlags) {
     mPending.clear();
     return;
   }
+  if (!mFile) return;  // refused: nothing was opened
   XmpFilePtr file = F(mFile);
   mFile = nullptr;
+  // Whenever the handler can, it writes a new file and swaps it in, so a
+  // failed or interrupted write leaves the original as it was.
+  if ((mOpenFlags & kXMPFiles_OpenForUpdate) && (mHandlerFlags & kXMPFiles_AllowsSafeUpdate))
+    closeFlags |= kXMPFiles_UpdateSafely;
   const bool ok = xmp_files_close(file, static_cast<XmpCloseFileOptions>(closeFlags));
   const int id = ok ? 0 : xmp_get_error();
   xmp_files_free(file);
@@ -138,6 +174,9 @@ bool XMPFiles::GetFileInfo(std::string* filePath, XMP_OptionBits* openFlags, XMP
 bool XMPFiles::GetXMP(XMPMeta* xmpObj, std::string* rawPacket) {
   if (!mOpen) detail::Throw(kXMPErr_BadObject, "no file open");
   if (mSidecar) {
+    std::error_code ec;
+    const auto size = fs::file_size(PathOf(mPath), ec);
+    if (!ec && size > detail::kMaxPacketBytes) detail::Throw(kXMPErr_BadXML, "reading \"" + mPath + "\": packet too large");
     std::ifstream in(PathOf(mPath), std::ios::binary);
     std::ostringstream content;
     content << in.rdbuf();
@@ -147,6 +186,7 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj, std::string* rawPacket) {
     if (rawPacket) *rawPacket = text;
     return true;
   }
+  if (!mFile) return false;  // refused: its XMP counts as unreadable
   XmpFilePtr file = F(mFile);
   if (rawPacket) {
     detail::XmpString raw;
@@ -181,6 +221,7 @@ bool XMPFiles::CanPutXMP(const XMPMeta& xmpObj) {
   detail::Require(xmpObj.GetInternalRef());
   if (!(mOpenFlags & kXMPFiles_OpenForUpdate)) return false;
   if (mSidecar) return true;
+  if (!mFile) return false;
   const XMPMeta clean = WithoutTransient(xmpObj);
   return xmp_files_can_put_xmp(F(mFile), clean.GetInternalRef()->Xmp());
 }
@@ -207,7 +248,7 @@ XMP_FileFormat XMPFiles::CheckFileFormat(const std::string& filePath) {
   if (!IsRegularFile(filePath)) return kXMP_UnknownFile;
   if (IsSidecarPath(filePath)) return kXMP_XMLFile;
   detail::EnsureStarted();
-  return static_cast<XMP_FileFormat>(xmp_files_check_file_format(filePath.c_str()));
+  return static_cast<XMP_FileFormat>(xmp_files_check_file_format(ToolkitPath(filePath).c_str()));
 }
 
 bool XMPFiles::GetFormatInfo(XMP_FileFormat format, XMP_OptionBits* handlerFlags) {

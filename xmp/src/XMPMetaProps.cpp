@@ -4,12 +4,11 @@
 #include <algorithm>
 #include <string>
 
-#include <expat.h>
-
 #include <ovraxmp/XMPMeta.h>
 #include <ovraxmp/XMPUtils.h>
 
 #include "XMPPacket.h"
+#include "XMPScan.h"
 
 namespace ovraxmp {
 namespace {
@@ -88,48 +87,6 @@ void CheckIndex(XMP_Index index) {
   if (index == 0 || index < kXMP_ArrayLastItem) detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(index));
 }
 
-// The toolkit's RDF reader recurses per element and overflows the stack on
-// absurdly nested input; such documents (and malformed ones, which it would
-// refuse anyway, after complaining on stderr) are turned away first by a
-// bare expat pass that only counts depth.
-struct DepthScan {
-  XML_Parser parser = nullptr;
-  int depth = 0;
-  std::string problem;
-
-  static void Stop(DepthScan& self, const char* why) {
-    if (self.problem.empty()) self.problem = why;
-    XML_StopParser(self.parser, XML_FALSE);
-  }
-  static void XMLCALL Start(void* data, const XML_Char*, const XML_Char**) {
-    auto& self = *static_cast<DepthScan*>(data);
-    if (++self.depth > 256) Stop(self, "elements nested too deeply");
-  }
-  static void XMLCALL End(void* data, const XML_Char*) { --static_cast<DepthScan*>(data)->depth; }
-  static void XMLCALL Doctype(void* data, const XML_Char*, const XML_Char*, const XML_Char*, int) {
-    Stop(*static_cast<DepthScan*>(data), "DOCTYPE is not allowed");
-  }
-};
-
-void RequireSaneXML(const char* buffer, std::size_t length) {
-  while (length > 0 && buffer[length - 1] == '\0') --length;  // padding the toolkit tolerates
-  DepthScan scan;
-  scan.parser = XML_ParserCreate(nullptr);
-  if (!scan.parser) detail::Throw(kXMPErr_NoMemory, "parsing XMP");
-  XML_SetUserData(scan.parser, &scan);
-  XML_SetElementHandler(scan.parser, &DepthScan::Start, &DepthScan::End);
-  XML_SetStartDoctypeDeclHandler(scan.parser, &DepthScan::Doctype);
-  bool ok = true;
-  const std::size_t chunk = 1u << 30;
-  for (std::size_t done = 0; ok && done < length; done += chunk) {
-    const std::size_t part = std::min(chunk, length - done);
-    ok = XML_Parse(scan.parser, buffer + done, static_cast<int>(part), done + part == length) == XML_STATUS_OK;
-  }
-  if (!ok && scan.problem.empty()) scan.problem = XML_ErrorString(XML_GetErrorCode(scan.parser));
-  XML_ParserFree(scan.parser);
-  if (!ok) detail::Throw(kXMPErr_BadXML, "parsing XMP: " + scan.problem);
-}
-
 // A bare rdf:RDF (no x:xmpmeta around it) gets the wrapper the toolkit wants.
 std::string WrapBareRDF(const char* buffer, std::size_t length) {
   const std::string text(buffer, length);
@@ -179,8 +136,12 @@ void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_Option
       buffer = wrapped.data();
       length = wrapped.size();
     }
+    // The toolkit's RDF reader recurses per element and searches a node's
+    // properties linearly: absurd nesting or property counts are refused
+    // first (malformed XML too, which it would refuse after complaining on
+    // stderr).
     try {
-      RequireSaneXML(buffer, length);
+      detail::RequireSanePacket(buffer, length);
     } catch (...) {
       xmp_free(fresh);
       throw;

@@ -28,23 +28,31 @@ class XMPFiles {
 
   // False when the file does not exist, no handler takes it, or it cannot
   // be opened as asked (kXMPFiles_OpenForUpdate on a read-only file).
-  // format kXMP_UnknownFile lets the toolkit detect the format.
+  // format kXMP_UnknownFile lets the toolkit detect the format. Files are
+  // checked before any handler sees them (packets with absurd nesting or
+  // property counts, XMP that exists but is empty or malformed, box trees
+  // that are too deep or have broken sizes): such a file opens for reading
+  // as one without XMP (GetXMP false, GetRefusal says why) and does not
+  // open for update.
   bool OpenFile(const std::string& filePath, XMP_FileFormat format = kXMP_UnknownFile,
                 XMP_OptionBits openFlags = 0);
   // Writes the packet given to PutXMP (when opened for update) and closes.
-  // kXMPFiles_UpdateSafely writes through a temporary file. Closing a
-  // closed object does nothing.
+  // Writes go through a temporary file that replaces the original whenever
+  // the format's handler allows it (kXMPFiles_UpdateSafely is then implied).
+  // Closing a closed object does nothing.
   void CloseFile(XMP_OptionBits closeFlags = 0);
   // False when no file is open. Any out pointer may be null.
   bool GetFileInfo(std::string* filePath = nullptr, XMP_OptionBits* openFlags = nullptr,
                    XMP_FileFormat* format = nullptr, XMP_OptionBits* handlerFlags = nullptr) const;
   // Reads the file's XMP into xmpObj (replacing its content) and/or the raw
-  // packet text; false when the file has none.
+  // packet text; false when the file has none or its XMP was refused.
   bool GetXMP(XMPMeta* xmpObj = nullptr, std::string* rawPacket = nullptr);
   // Whether PutXMP can store this packet (kXMPErr_BadObject when closed).
   bool CanPutXMP(const XMPMeta& xmpObj);
   // Stages the packet for writing at CloseFile (transient data excluded).
   void PutXMP(const XMPMeta& xmpObj);
+  // Why the open file was refused to the handlers; empty when it was not.
+  const std::string& GetRefusal() const { return mRefusal; }
 
   // ---- Process-wide ----
   // Counted start of the file part (it also holds a start of the core). The
@@ -77,6 +85,7 @@ class XMPFiles {
   XMP_OptionBits mHandlerFlags = 0;
   std::string mPending;  // sidecar packet to write at close
   bool mHasPending = false;
+  std::string mRefusal;
 };
 
 }  // namespace ovraxmp

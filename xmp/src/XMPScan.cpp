@@ -1,0 +1,528 @@
+// The bounded pre-scans of packets and media files (see XMPScan.h).
+#include "XMPScan.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstring>
+#include <limits>
+#include <map>
+#include <vector>
+
+#include <expat.h>
+
+#include <ovraxmp/XMPError.h>
+
+#include "XMPPacket.h"
+
+namespace ovraxmp {
+namespace detail {
+
+// ---------------------------------------------------------------------------
+// PacketScanner
+
+namespace {
+
+constexpr char kSep = '\x01';  // between namespace URI and local name
+const std::string kRDF = std::string("http://www.w3.org/1999/02/22-rdf-syntax-ns#") + kSep + "RDF";
+const std::string kDescription =
+    std::string("http://www.w3.org/1999/02/22-rdf-syntax-ns#") + kSep + "Description";
+
+enum class NodeKind : unsigned char { kOther, kRDF, kTopDescription };
+
+}  // namespace
+
+struct PacketScanner::State {
+  PacketScanner* owner = nullptr;
+  XML_Parser parser = nullptr;
+  std::vector<std::uint32_t> counts;  // properties of each open element
+  std::vector<NodeKind> kinds;
+  std::uint32_t topLevelProperties = 0;  // of every rdf:Description under rdf:RDF
+  std::uint64_t fed = 0;
+
+  void Stop(const std::string& why) noexcept {
+    if (owner->mProblem.empty()) owner->mProblem = why;
+    XML_StopParser(parser, XML_FALSE);
+  }
+
+  bool Add(std::uint32_t* count, std::uint32_t more) noexcept {
+    *count += std::min<std::uint32_t>(more, kMaxPropertiesPerNode + 1);
+    if (*count <= kMaxPropertiesPerNode) return true;
+    Stop("more than " + std::to_string(kMaxPropertiesPerNode) + " properties on one node");
+    return false;
+  }
+
+  static void XMLCALL Start(void* data, const XML_Char* name, const XML_Char** atts) noexcept {
+    State& self = *static_cast<State*>(data);
+    if (self.counts.size() + 1 > static_cast<std::size_t>(kMaxNestingDepth)) {
+      self.Stop("elements nested deeper than " + std::to_string(kMaxNestingDepth) + " levels");
+      return;
+    }
+    const NodeKind parent = self.kinds.empty() ? NodeKind::kOther : self.kinds.back();
+    if (!self.counts.empty()) {
+      std::uint32_t* count = parent == NodeKind::kTopDescription ? &self.topLevelProperties : &self.counts.back();
+      if (!self.Add(count, 1)) return;
+    }
+    std::uint32_t attributes = 0;
+    for (const XML_Char** a = atts; *a; a += 2) ++attributes;
+    NodeKind kind = NodeKind::kOther;
+    if (kRDF == name) {
+      kind = NodeKind::kRDF;
+      self.topLevelProperties = 0;
+    } else if (parent == NodeKind::kRDF && kDescription == name) {
+      kind = NodeKind::kTopDescription;
+    }
+    std::uint32_t own = 0;
+    if (!self.Add(kind == NodeKind::kTopDescription ? &self.topLevelProperties : &own, attributes)) return;
+    self.counts.push_back(own);
+    self.kinds.push_back(kind);
+  }
+
+  static void XMLCALL End(void* data, const XML_Char*) noexcept {
+    State& self = *static_cast<State*>(data);
+    if (self.counts.empty()) return;
+    self.counts.pop_back();
+    self.kinds.pop_back();
+    if (self.counts.empty() && self.owner->mStopAtRootEnd) {
+      self.owner->mComplete = true;
+      XML_StopParser(self.parser, XML_FALSE);
+    }
+  }
+
+  static void XMLCALL Doctype(void* data, const XML_Char*, const XML_Char*, const XML_Char*, int) noexcept {
+    static_cast<State*>(data)->Stop("a DOCTYPE is not allowed");
+  }
+};
+
+PacketScanner::PacketScanner() : mState(new State) {
+  mState->owner = this;
+  mState->parser = XML_ParserCreateNS(nullptr, kSep);
+  if (!mState->parser) Throw(kXMPErr_NoMemory, "scanning XMP");
+  XML_SetUserData(mState->parser, mState.get());
+  XML_SetElementHandler(mState->parser, &State::Start, &State::End);
+  XML_SetStartDoctypeDeclHandler(mState->parser, &State::Doctype);
+}
+
+PacketScanner::~PacketScanner() { XML_ParserFree(mState->parser); }
+
+bool PacketScanner::Feed(const char* data, std::size_t length, bool last) {
+  if (Refused()) return false;
+  if (mComplete) return true;
+  mState->fed += length;
+  if (mState->fed > kMaxPacketBytes) {
+    mProblem = "packet larger than " + std::to_string(kMaxPacketBytes >> 20) + " MB";
+    return false;
+  }
+  const std::size_t kPiece = 1u << 30;  // expat takes int lengths
+  std::size_t done = 0;
+  do {
+    const std::size_t part = std::min(kPiece, length - done);
+    const bool final = last && done + part == length;
+    if (XML_Parse(mState->parser, data + done, static_cast<int>(part), final) != XML_STATUS_OK) {
+      if (mComplete) return true;
+      if (mProblem.empty()) mProblem = XML_ErrorString(XML_GetErrorCode(mState->parser));
+      return false;
+    }
+    if (mComplete) return true;
+    done += part;
+  } while (done < length);
+  return true;
+}
+
+std::uint64_t PacketScanner::Consumed() const {
+  const XML_Index index = XML_GetCurrentByteIndex(mState->parser);
+  return index < 0 ? mState->fed : static_cast<std::uint64_t>(index);
+}
+
+void RequireSanePacket(const char* buffer, std::size_t length) {
+  while (length > 0 && buffer[length - 1] == '\0') --length;  // padding the toolkit tolerates
+  if (length > kMaxPacketBytes)
+    Throw(kXMPErr_BadXML, "parsing XMP: packet larger than " + std::to_string(kMaxPacketBytes >> 20) + " MB");
+  PacketScanner scan;
+  if (!scan.Feed(buffer, length, true)) Throw(kXMPErr_BadXML, "parsing XMP: " + scan.Problem());
+}
+
+// ---------------------------------------------------------------------------
+// Media files
+
+namespace {
+
+constexpr int kMaxContainerDepth = 32;            // real files nest fewer than 10 levels
+constexpr std::uint64_t kMaxBoxes = 1000000;      // boxes or chunks visited per file
+constexpr std::uint32_t kMaxPacketsPerFile = 1000;
+constexpr std::size_t kReadPiece = 1u << 20;
+
+std::uint32_t BE32(const unsigned char* p) {
+  return (std::uint32_t(p[0]) << 24) | (std::uint32_t(p[1]) << 16) | (std::uint32_t(p[2]) << 8) | p[3];
+}
+std::uint32_t LE32(const unsigned char* p) {
+  return (std::uint32_t(p[3]) << 24) | (std::uint32_t(p[2]) << 16) | (std::uint32_t(p[1]) << 8) | p[0];
+}
+std::uint64_t BE64(const unsigned char* p) { return (std::uint64_t(BE32(p)) << 32) | BE32(p + 4); }
+
+// The file, read in pieces with pread: a hostile file may be huge, and one
+// truncated while it is read must not bring the process down.
+class Reader {
+ public:
+  explicit Reader(const std::string& path) {
+    mFd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    struct stat info {};
+    if (mFd >= 0 && ::fstat(mFd, &info) == 0) mSize = static_cast<std::uint64_t>(info.st_size);
+  }
+  ~Reader() {
+    if (mFd >= 0) ::close(mFd);
+  }
+  Reader(const Reader&) = delete;
+  Reader& operator=(const Reader&) = delete;
+
+  bool Ok() const { return mFd >= 0; }
+  std::uint64_t Size() const { return mSize; }
+  // Exactly length bytes at offset, or false.
+  bool Read(std::uint64_t offset, void* out, std::size_t length) const {
+    auto* p = static_cast<char*>(out);
+    while (length > 0) {
+      const ssize_t got = ::pread(mFd, p, length, static_cast<off_t>(offset));
+      if (got <= 0) return false;
+      p += got;
+      offset += static_cast<std::uint64_t>(got);
+      length -= static_cast<std::size_t>(got);
+    }
+    return true;
+  }
+
+ private:
+  int mFd = -1;
+  std::uint64_t mSize = 0;
+};
+
+// Outcome of a walk: an empty problem means the file may be handed over.
+struct Verdict {
+  std::string problem;
+  bool Refuse(const std::string& why) {
+    if (problem.empty()) problem = why;
+    return false;
+  }
+};
+
+bool IsBlank(const std::vector<char>& bytes) {
+  return std::all_of(bytes.begin(), bytes.end(),
+                     [](char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\n' || c == '\0'; });
+}
+
+// Scans one stored packet of known extent; an empty one is refused too: the
+// file has XMP that a write would silently replace.
+bool ScanStoredPacket(const Reader& file, std::uint64_t offset, std::uint64_t length, const char* where,
+                      Verdict* verdict) {
+  if (length > kMaxPacketBytes)
+    return verdict->Refuse(std::string(where) + ": packet larger than " + std::to_string(kMaxPacketBytes >> 20) + " MB");
+  PacketScanner scan;
+  std::vector<char> piece;
+  bool blank = true;
+  std::uint64_t done = 0;
+  do {
+    const std::size_t part = static_cast<std::size_t>(std::min<std::uint64_t>(kReadPiece, length - done));
+    piece.resize(part);
+    if (!file.Read(offset + done, piece.data(), part)) return verdict->Refuse(std::string(where) + ": truncated");
+    blank = blank && IsBlank(piece);
+    std::size_t use = part;
+    done += part;
+    if (done == length) {
+      while (use > 0 && piece[use - 1] == '\0') --use;  // padding
+    }
+    if (!scan.Feed(piece.data(), use, done == length))
+      return verdict->Refuse(std::string(where) + (blank && done == length ? ": empty XMP" : ": " + scan.Problem()));
+  } while (done < length);
+  return true;
+}
+
+// ---- JPEG: segments up to the image data; standard and Extended XMP ----
+
+const char kXMPSignature[] = "http://ns.adobe.com/xap/1.0/";             // + NUL
+const char kExtendedSignature[] = "http://ns.adobe.com/xmp/extension/";  // + NUL
+
+struct ExtendedChunk {
+  std::uint32_t offset;
+  std::uint64_t fileOffset;
+  std::uint32_t length;
+};
+
+bool WalkJPEG(const Reader& file, Verdict* verdict) {
+  struct Group {
+    std::uint32_t fullLength = 0;
+    std::vector<ExtendedChunk> chunks;
+  };
+  std::map<std::string, Group> extended;
+  std::uint64_t pos = 2;
+  std::uint64_t segments = 0;
+  while (pos + 4 <= file.Size()) {
+    unsigned char head[4];
+    if (!file.Read(pos, head, 1) || head[0] != 0xFF) break;  // not a marker: image data or damage
+    // A marker may be preceded by fill bytes; a long run of them is not a
+    // JPEG the handler would get further in.
+    int fill = 0;
+    while (file.Read(pos + 1, head + 1, 1) && head[1] == 0xFF && ++fill < 64) ++pos;
+    if (head[1] == 0xFF) break;
+    const unsigned char marker = head[1];
+    if (marker == 0xD9 || marker == 0xDA) break;
+    if ((marker >= 0xD0 && marker <= 0xD7) || marker == 0x01 || marker == 0xD8) {
+      pos += 2;
+      continue;
+    }
+    if (++segments > kMaxBoxes) return verdict->Refuse("JPEG: too many segments");
+    if (!file.Read(pos + 2, head + 2, 2)) break;
+    const std::uint32_t length = (std::uint32_t(head[2]) << 8) | head[3];
+    if (length < 2) return verdict->Refuse("JPEG: segment with a broken length");
+    if (pos + 2 + length > file.Size()) break;  // truncated: the handler stops there too
+    if (marker == 0xE1) {
+      const std::uint64_t content = pos + 4;
+      const std::uint32_t size = length - 2;
+      unsigned char sig[sizeof(kExtendedSignature)] = {};
+      const std::size_t have = std::min<std::size_t>(sizeof sig, size);
+      if (!file.Read(content, sig, have)) break;
+      if (have >= sizeof kXMPSignature && std::memcmp(sig, kXMPSignature, sizeof kXMPSignature) == 0) {
+        if (!ScanStoredPacket(file, content + sizeof kXMPSignature, size - sizeof kXMPSignature, "JPEG XMP segment",
+                              verdict))
+          return false;
+      } else if (have == sizeof kExtendedSignature &&
+                 std::memcmp(sig, kExtendedSignature, sizeof kExtendedSignature) == 0) {
+        constexpr std::uint32_t kHeader = sizeof kExtendedSignature + 32 + 4 + 4;
+        if (size < kHeader) return verdict->Refuse("JPEG Extended XMP: segment too short");
+        unsigned char fields[40];
+        if (!file.Read(content + sizeof kExtendedSignature, fields, sizeof fields)) break;
+        Group& group = extended[std::string(reinterpret_cast<char*>(fields), 32)];
+        const std::uint32_t full = BE32(fields + 32);
+        if (!group.chunks.empty() && group.fullLength != full)
+          return verdict->Refuse("JPEG Extended XMP: chunks disagree on the length");
+        group.fullLength = full;
+        group.chunks.push_back({BE32(fields + 36), content + kHeader, size - kHeader});
+      }
+    }
+    pos += 2 + length;
+  }
+  for (auto& entry : extended) {
+    Group& group = entry.second;
+    if (group.fullLength > kMaxPacketBytes)
+      return verdict->Refuse("JPEG Extended XMP larger than " + std::to_string(kMaxPacketBytes >> 20) + " MB");
+    std::sort(group.chunks.begin(), group.chunks.end(),
+              [](const ExtendedChunk& a, const ExtendedChunk& b) { return a.offset < b.offset; });
+    // Only an exact tiling is a packet; anything else would be assembled
+    // differently by us and by the handler.
+    std::uint64_t expected = 0;
+    for (const ExtendedChunk& chunk : group.chunks) {
+      if (chunk.offset != expected) return verdict->Refuse("JPEG Extended XMP: chunks do not fit together");
+      expected += chunk.length;
+    }
+    if (expected != group.fullLength) return verdict->Refuse("JPEG Extended XMP: incomplete");
+    if (expected == 0) return verdict->Refuse("JPEG Extended XMP: empty XMP");
+    PacketScanner scan;
+    std::vector<char> piece;
+    for (std::size_t i = 0; i < group.chunks.size(); ++i) {
+      const ExtendedChunk& chunk = group.chunks[i];
+      piece.resize(chunk.length);
+      if (!file.Read(chunk.fileOffset, piece.data(), piece.size()))
+        return verdict->Refuse("JPEG Extended XMP: truncated");
+      if (!scan.Feed(piece.data(), piece.size(), i + 1 == group.chunks.size()))
+        return verdict->Refuse("JPEG Extended XMP: " + scan.Problem());
+    }
+  }
+  return true;
+}
+
+// ---- ISO media (MP4, QuickTime): the box tree ----
+
+const unsigned char kXMPUuid[16] = {0xBE, 0x7A, 0xCF, 0xCB, 0x97, 0xA9, 0x42, 0xE8,
+                                    0x9C, 0x71, 0x99, 0x94, 0x91, 0xE3, 0xAF, 0xAC};
+
+bool IsBoxContainer(const std::string& type) {
+  static const char* const kContainers[] = {"moov", "trak", "mdia", "minf", "stbl", "udta", "edts", "dinf",
+                                            "mvex", "moof", "traf", "mfra", "tref", "ilst", "meta"};
+  return std::any_of(std::begin(kContainers), std::end(kContainers), [&](const char* c) { return type == c; });
+}
+
+bool LooksLikeISOMedia(const Reader& file) {
+  unsigned char head[8];
+  if (file.Size() < 8 || !file.Read(0, head, 8)) return false;
+  const std::string type(reinterpret_cast<char*>(head + 4), 4);
+  static const char* const kFirst[] = {"ftyp", "moov", "mdat", "free", "skip", "wide", "pnot", "uuid"};
+  return std::any_of(std::begin(kFirst), std::end(kFirst), [&](const char* c) { return type == c; });
+}
+
+bool WalkBoxes(const Reader& file, std::uint64_t pos, std::uint64_t end, int depth, std::uint64_t* boxes,
+               Verdict* verdict) {
+  if (depth > kMaxContainerDepth) return verdict->Refuse("boxes nested too deeply");
+  while (pos < end) {
+    if (end - pos < 8) {
+      if (depth == 0) return true;  // trailing bytes after the last box
+      return verdict->Refuse("box with a broken size");
+    }
+    unsigned char head[16];
+    if (!file.Read(pos, head, 8)) return verdict->Refuse("box header cut short");
+    const std::string type(reinterpret_cast<char*>(head + 4), 4);
+    std::uint64_t size = BE32(head);
+    std::uint64_t header = 8;
+    if (size == 1) {
+      if (end - pos < 16 || !file.Read(pos + 8, head + 8, 8)) return verdict->Refuse("box with a broken size");
+      size = BE64(head + 8);
+      header = 16;
+    } else if (size == 0) {
+      size = end - pos;  // runs to the end of its parent
+    }
+    if (size < header) return verdict->Refuse("box \"" + type + "\" with a broken size");
+    if (size > end - pos) {
+      // A cut-off download leaves the media data short; anything else that
+      // overruns its parent is damage the handler would misread.
+      if (depth == 0 && type == "mdat") return true;
+      return verdict->Refuse("box \"" + type + "\" runs past its parent");
+    }
+    if (++*boxes > kMaxBoxes) return verdict->Refuse("too many boxes");
+    const std::uint64_t body = pos + header;
+    if (type == "uuid") {
+      unsigned char uuid[16];
+      if (size - header >= 16 && file.Read(body, uuid, 16) && std::memcmp(uuid, kXMPUuid, 16) == 0) {
+        if (!ScanStoredPacket(file, body + 16, size - header - 16, "XMP box", verdict)) return false;
+      }
+    } else if (type == "XMP_") {
+      if (!ScanStoredPacket(file, body, size - header, "XMP_ box", verdict)) return false;
+    } else if (IsBoxContainer(type)) {
+      std::uint64_t children = body;
+      if (type == "meta" && size - header >= 4) {
+        // An ISO meta box starts with version and flags; a QuickTime one
+        // starts with its first child.
+        unsigned char versionFlags[4];
+        if (file.Read(body, versionFlags, 4) && BE32(versionFlags) == 0) children += 4;
+      }
+      if (!WalkBoxes(file, children, pos + size, depth + 1, boxes, verdict)) return false;
+    }
+    pos += size;
+  }
+  return true;
+}
+
+// ---- RIFF (WAV, AVI): the chunk tree ----
+
+bool LooksLikeRIFF(const Reader& file) {
+  unsigned char head[12];
+  return file.Size() >= 12 && file.Read(0, head, 12) &&
+         (std::memcmp(head, "RIFF", 4) == 0 || std::memcmp(head, "RF64", 4) == 0);
+}
+
+bool WalkChunks(const Reader& file, std::uint64_t pos, std::uint64_t end, int depth, std::uint64_t* chunks,
+                Verdict* verdict) {
+  if (depth > kMaxContainerDepth) return verdict->Refuse("chunks nested too deeply");
+  while (pos + 8 <= end) {
+    unsigned char head[12];
+    if (!file.Read(pos, head, 8)) return true;
+    const std::string id(reinterpret_cast<char*>(head), 4);
+    std::uint64_t size = LE32(head + 4);
+    if (id == "RF64" || (depth == 0 && size == 0xFFFFFFFFu)) size = end - pos - 8;  // real size kept elsewhere
+    if (size > end - pos - 8) {
+      // Recordings cut short are common: read what is there, as the handler does.
+      size = end - pos - 8;
+    }
+    if (++*chunks > kMaxBoxes) return verdict->Refuse("too many chunks");
+    if ((id == "RIFF" || id == "RF64" || id == "LIST") && size >= 4) {
+      if (!WalkChunks(file, pos + 12, pos + 8 + size, depth + 1, chunks, verdict)) return false;
+    } else if (id == "_PMX") {
+      if (!ScanStoredPacket(file, pos + 8, size, "RIFF XMP chunk", verdict)) return false;
+    }
+    pos += 8 + size + (size & 1);
+  }
+  return true;
+}
+
+// ---- Anything else: packets found by their markers ----
+
+// The length of the packet start at p, 0 when none starts there. UTF-16
+// packets are taken as little-endian from their '<': a big-endian one read
+// one byte late spells the same markup, which is all the scan looks at.
+std::size_t PacketStartAt(const char* p, std::size_t available, bool* wide) {
+  static const char* const kMarkers[] = {"<?xpacket begin", "<x:xmpmeta", "<x:xapmeta", "<rdf:RDF"};
+  for (const char* marker : kMarkers) {
+    const std::size_t n = std::strlen(marker);
+    if (available >= n && std::memcmp(p, marker, n) == 0) {
+      *wide = false;
+      return n;
+    }
+  }
+  // "<?xp" in UTF-16.
+  static const char kLittle[] = {'<', 0, '?', 0, 'x', 0, 'p', 0};
+  if (available >= sizeof kLittle && std::memcmp(p, kLittle, sizeof kLittle) == 0) {
+    *wide = true;
+    return sizeof kLittle;
+  }
+  return 0;
+}
+
+bool ScanForPackets(const Reader& file, Verdict* verdict) {
+  std::vector<char> buffer;
+  std::uint32_t packets = 0;
+  std::uint64_t pos = 0;
+  constexpr std::size_t kOverlap = 16;  // longer than any marker
+  while (pos < file.Size()) {
+    const std::size_t part = static_cast<std::size_t>(std::min<std::uint64_t>(kReadPiece, file.Size() - pos));
+    buffer.resize(part);
+    if (!file.Read(pos, buffer.data(), part)) return true;
+    std::uint64_t next = pos + (part > kOverlap && pos + part < file.Size() ? part - kOverlap : part);
+    for (std::size_t i = 0; i < part;) {
+      const char* hit = static_cast<const char*>(std::memchr(buffer.data() + i, '<', part - i));
+      if (!hit) break;
+      std::size_t at = static_cast<std::size_t>(hit - buffer.data());
+      bool wide = false;
+      if (!PacketStartAt(hit, part - at, &wide)) {
+        i = at + 1;
+        continue;
+      }
+      if (++packets > kMaxPacketsPerFile) return verdict->Refuse("too many XMP packets");
+      const std::uint64_t start = pos + at;
+      PacketScanner scan;
+      scan.StopAtRootEnd();
+      std::vector<char> piece;
+      std::uint64_t done = 0;
+      while (!scan.Complete() && !scan.Refused()) {
+        const std::uint64_t left = file.Size() - start - done;
+        const std::size_t size = static_cast<std::size_t>(std::min<std::uint64_t>(kReadPiece, left));
+        piece.resize(size);
+        if (size > 0 && !file.Read(start + done, piece.data(), size)) return true;
+        done += size;
+        scan.Feed(piece.data(), size, done == file.Size() - start);
+        if (size == 0) break;
+      }
+      if (scan.Refused()) return verdict->Refuse("XMP packet at byte " + std::to_string(start) + ": " + scan.Problem());
+      const std::uint64_t resume = start + std::max<std::uint64_t>(scan.Consumed(), 1);
+      if (resume >= pos + part) {
+        next = resume;
+        break;
+      }
+      i = static_cast<std::size_t>(resume - pos);
+    }
+    pos = std::max(next, pos + 1);
+  }
+  return true;
+}
+
+}  // namespace
+
+bool MediaFileIsSane(const std::string& utf8Path, std::string* problem) {
+  const Reader file(utf8Path);
+  if (!file.Ok() || file.Size() == 0) return true;
+  Verdict verdict;
+  std::uint64_t boxes = 0;
+  unsigned char head[2] = {};
+  bool sane;
+  if (file.Read(0, head, 2) && head[0] == 0xFF && head[1] == 0xD8) {
+    sane = WalkJPEG(file, &verdict);
+  } else if (LooksLikeISOMedia(file)) {
+    sane = WalkBoxes(file, 0, file.Size(), 0, &boxes, &verdict);
+  } else if (LooksLikeRIFF(file)) {
+    sane = WalkChunks(file, 0, file.Size(), 0, &boxes, &verdict);
+  } else {
+    sane = ScanForPackets(file, &verdict);
+  }
+  if (!sane && problem) *problem = verdict.problem;
+  return sane;
+}
+
+}  // namespace detail
+}  // namespace ovraxmp
