@@ -1,7 +1,5 @@
 #include <csignal>
-#include <cstdlib>
 #include <filesystem>
-#include <optional>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -15,35 +13,12 @@
 
 using namespace ovracore;
 using namespace ovracore::filesupport;
+using ovratest::ScopedEnv;
 namespace fs = std::filesystem;
 
 namespace {
 
 UTF16String U(const fs::path& path) { return FromFSPath(path); }
-
-// Sets or unsets an environment variable for one scope.
-class ScopedEnv {
- public:
-  ScopedEnv(const char* name, const char* value) : mName(name) {
-    if (const char* old = std::getenv(name)) mOld = old;
-    if (value) {
-      setenv(name, value, 1);
-    } else {
-      unsetenv(name);
-    }
-  }
-  ~ScopedEnv() {
-    if (mOld) {
-      setenv(mName, mOld->c_str(), 1);
-    } else {
-      unsetenv(mName);
-    }
-  }
-
- private:
-  const char* mName;
-  std::optional<std::string> mOld;
-};
 
 std::size_t EntriesIn(const fs::path& folder) {
   return static_cast<std::size_t>(std::distance(fs::directory_iterator(folder), fs::directory_iterator()));

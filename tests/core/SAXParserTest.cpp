@@ -129,22 +129,16 @@ TEST(SAXParser, MalformedDocumentsFailAfterDeliveringEarlierEvents) {
 }
 
 TEST(SAXParser, DoctypeAndEntityAttacksAreRefused) {
-  const std::string laughs =
-      "<?xml version=\"1.0\"?><!DOCTYPE lolz [<!ENTITY lol \"lol\">"
-      "<!ENTITY lol1 \"&lol;&lol;&lol;&lol;&lol;&lol;&lol;&lol;&lol;&lol;\">"
-      "<!ENTITY lol2 \"&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;&lol1;\">"
-      "<!ENTITY lol3 \"&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;&lol2;\">"
-      "<!ENTITY lol4 \"&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;&lol3;\">"
-      "<!ENTITY lol5 \"&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;&lol4;\">"
-      "<!ENTITY lol6 \"&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;&lol5;\">"
-      "<!ENTITY lol7 \"&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;&lol6;\">"
-      "<!ENTITY lol8 \"&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;&lol7;\">"
-      "<!ENTITY lol9 \"&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;&lol8;\">"
-      "]><lolz>&lol9;</lolz>";
-  const std::string external =
-      "<!DOCTYPE r [<!ENTITY secret SYSTEM \"file:///etc/passwd\">]><r>&secret;</r>";
-  const std::string plainDoctype = "<!DOCTYPE r><r/>";
-  for (const std::string& xml : {laughs, external, plainDoctype}) {
+  std::string laughs = "<?xml version=\"1.0\"?><!DOCTYPE lolz [<!ENTITY lol0 \"lol\">";
+  for (int level = 1; level <= 9; ++level) {
+    laughs += "<!ENTITY lol" + std::to_string(level) + " \"";
+    for (int i = 0; i < 10; ++i) laughs += "&lol" + std::to_string(level - 1) + ";";
+    laughs += "\">";
+  }
+  laughs += "]><lolz>&lol9;</lolz>";
+  for (const std::string& xml :
+       {laughs, std::string("<!DOCTYPE r [<!ENTITY secret SYSTEM \"file:///etc/passwd\">]><r>&secret;</r>"),
+        std::string("<!DOCTYPE r><r/>")}) {
     Recorder r;
     std::string error;
     EXPECT_FALSE(Parse(r, xml, &error));
@@ -154,29 +148,31 @@ TEST(SAXParser, DoctypeAndEntityAttacksAreRefused) {
 }
 
 TEST(SAXParser, DepthChildrenAndSizeLimits) {
-  Recorder r1;
-  EXPECT_TRUE(Parse(r1, Nested(512)));
-  Recorder r2;
-  std::string error;
-  EXPECT_FALSE(Parse(r2, Nested(513), &error));
-  EXPECT_NE(error.find("nested"), std::string::npos) << error;
-  Recorder r3;
-  EXPECT_FALSE(Parse(r3, Nested(200000)));
-
   ParserLimits few;
   few.maxChildrenPerElement = 3;
-  Recorder r4;
-  EXPECT_TRUE(Parse(r4, "<r><a/><b><x/><y/><z/></b><c/></r>", nullptr, few));
-  Recorder r5;
-  EXPECT_FALSE(Parse(r5, "<r><a/><b/><c/><d/></r>", &error, few));
-  EXPECT_NE(error.find("children"), std::string::npos) << error;
-
   ParserLimits small;
   small.maxBytes = 17;
-  Recorder r6;
-  EXPECT_TRUE(Parse(r6, "<r>0123456789</r>", nullptr, small));
-  Recorder r7;
-  EXPECT_FALSE(Parse(r7, "<r>0123456789 </r>", nullptr, small));
+  const struct {
+    std::string xml;
+    ParserLimits limits;
+    bool ok;
+    const char* errorWord;
+  } cases[] = {
+      {Nested(512), {}, true, ""},
+      {Nested(513), {}, false, "nested"},
+      {Nested(200000), {}, false, ""},
+      {"<r><a/><b><x/><y/><z/></b><c/></r>", few, true, ""},
+      {"<r><a/><b/><c/><d/></r>", few, false, "children"},
+      {"<r>0123456789</r>", small, true, ""},
+      {"<r>0123456789 </r>", small, false, ""},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.xml.substr(0, 40));
+    Recorder r;
+    std::string error;
+    EXPECT_EQ(Parse(r, c.xml, &error, c.limits), c.ok);
+    EXPECT_NE(error.find(c.errorWord), std::string::npos) << error;
+  }
 }
 
 TEST(SAXParser, HandlerExceptionEndsParseWithFailure) {

@@ -5,8 +5,10 @@
 #include <string>
 #include <vector>
 
+#include <ovracore/Diagnostics.h>
+
 #include "InitializeInternal.h"
-#include "SrcTestSupport.h"
+#include "MetadataTestSupport.h"
 
 using namespace ovrametadata;
 using ovratest::U16;
@@ -35,34 +37,14 @@ const char* const kLabelKeyStart = "$$$/ovrametadata/schema/";
 
 // The namespace each standard schema resource must declare, by enumerator.
 const char* const kStandardNamespaces[kStandardSchemaCount] = {
-    kDC,
-    kXMP,
-    kRights,
-    kMM,
-    "http://ns.adobe.com/xap/1.0/bj/",
-    "http://ns.adobe.com/xap/1.0/t/pg/",
-    kDM,
-    "http://ns.ovrametadata.org/xmp/assignment/1.0/",
-    "http://ns.ovrametadata.org/xmp/memo/1.0/",
-    "http://ns.adobe.com/pdf/1.3/",
-    kImageEditing,
-    kRawSettings,
-    kExif,
-    kExifEX,
-    kTiff,
-    "http://ns.ovrametadata.org/xmp/contentanalysis/1.0/",
-    "http://ns.adobe.com/xmp/1.0/Script/",
-    "http://ns.adobe.com/bwf/bext/1.0/",
-    kIptcCore,
-    kIptcExt,
-    kDICOM,
-    kPlus,
-    "http://ns.ovrametadata.org/xmp/mobile/1.0/",
-    "http://ns.ovrametadata.org/as11/core/1.0/",
-    "http://ns.ovrametadata.org/as11/ukdpp/1.0/",
-    "http://ns.ovrametadata.org/as11/structural/1.0/",
-    "http://ns.adobe.com/ixml/1.0/",
-    "http://ns.ovrametadata.org/xmp/editlist/1.0/",
+    kDC, kXMP, kRights, kMM, "http://ns.adobe.com/xap/1.0/bj/", "http://ns.adobe.com/xap/1.0/t/pg/", kDM,
+    "http://ns.ovrametadata.org/xmp/assignment/1.0/", "http://ns.ovrametadata.org/xmp/memo/1.0/",
+    "http://ns.adobe.com/pdf/1.3/", kImageEditing, kRawSettings, kExif, kExifEX, kTiff,
+    "http://ns.ovrametadata.org/xmp/contentanalysis/1.0/", "http://ns.adobe.com/xmp/1.0/Script/",
+    "http://ns.adobe.com/bwf/bext/1.0/", kIptcCore, kIptcExt, kDICOM, kPlus,
+    "http://ns.ovrametadata.org/xmp/mobile/1.0/", "http://ns.ovrametadata.org/as11/core/1.0/",
+    "http://ns.ovrametadata.org/as11/ukdpp/1.0/", "http://ns.ovrametadata.org/as11/structural/1.0/",
+    "http://ns.adobe.com/ixml/1.0/", "http://ns.ovrametadata.org/xmp/editlist/1.0/",
 };
 
 PropertyDefinitionPtr Property(const char* namespaceURI, const char* name) {
@@ -126,6 +108,12 @@ TEST(BuiltinDefinitions, StartUpLoadsEveryResourceWithoutAnyReport) {
   EXPECT_EQ(common.size(), static_cast<std::size_t>(kStandardSchemaCount));
   for (const char* namespaceURI : kStandardNamespaces) EXPECT_EQ(common.count(namespaceURI), 1u);
   EXPECT_TRUE(DynamicSchemaDefinitions().empty());
+
+  std::set<std::string> marks;
+  for (const auto& mark : ovracore::TimeMarks())
+    if (mark.category == "StartupTime") marks.insert(mark.text);
+  EXPECT_EQ(marks.count("Start Initializing ovrametadata"), 1u);
+  EXPECT_EQ(marks.count("Finish Initializing ovrametadata"), 1u);
 }
 
 TEST(BuiltinDefinitions, TypeChecksFindNothingAndEveryDeclarationIsRegistered) {
@@ -167,37 +155,29 @@ TEST(BuiltinDefinitions, TypeChecksFindNothingAndEveryDeclarationIsRegistered) {
 TEST(BuiltinDefinitions, LabelsAreLocalisationKeysWithEnglishDefaults) {
   ovratest::LibraryScope library;
   const Registered all = AllRegisteredBuiltins();
-  auto expectKeyed = [](const LocalizedDefinition& entry, const std::string& what) {
+  auto expectLabel = [](const std::u16string& source, const std::u16string& label, const std::string& what) {
     SCOPED_TRACE(what);
-    EXPECT_EQ(U8(entry.labelSource).rfind(kLabelKeyStart, 0), 0u) << U8(entry.labelSource);
+    EXPECT_EQ(U8(source).rfind(kLabelKeyStart, 0), 0u) << U8(source);
     // The localiser without a dictionary shows the text after the key.
-    EXPECT_FALSE(entry.label.empty());
-    EXPECT_EQ(U8(entry.label).find("$$$"), std::string::npos);
-    if (!entry.descriptionSource.empty()) {
-      EXPECT_EQ(U8(entry.description).find("$$$"), std::string::npos);
-    }
+    EXPECT_FALSE(label.empty());
+    EXPECT_EQ(U8(label).find("$$$"), std::string::npos);
   };
-  auto expectChoices = [](const EntryDefinition& entry, const std::string& what) {
-    for (const auto& choice : entry.constraints.choices) {
-      SCOPED_TRACE(what + "=" + choice->rawValue);
-      EXPECT_EQ(U8(choice->labelSource).rfind(kLabelKeyStart, 0), 0u);
-      EXPECT_FALSE(choice->label.empty());
-      EXPECT_EQ(U8(choice->label).find("$$$"), std::string::npos);
-    }
+  auto expectKeyed = [&](const LocalizedDefinition& entry, const std::string& what) {
+    expectLabel(entry.labelSource, entry.label, what);
+    EXPECT_EQ(U8(entry.description).find("$$$"), std::string::npos) << what;
+  };
+  auto expectEntryKeyed = [&](const EntryDefinition& entry, const std::string& what) {
+    expectKeyed(entry, what);
+    for (const auto& choice : entry.constraints.choices)
+      expectLabel(choice->labelSource, choice->label, what + "=" + choice->rawValue);
   };
   for (const auto& schema : all.schemas) {
     expectKeyed(*schema, schema->namespaceURI);
-    for (const auto& property : schema->properties) {
-      expectKeyed(*property, schema->prefix + ":" + property->name);
-      expectChoices(*property, schema->prefix + ":" + property->name);
-    }
+    for (const auto& property : schema->properties) expectEntryKeyed(*property, schema->prefix + ":" + property->name);
   }
   for (const auto& type : all.types) {
     expectKeyed(*type, type->name);
-    for (const auto& field : type->fields) {
-      expectKeyed(*field, type->name + "/" + field->name);
-      expectChoices(*field, type->name + "/" + field->name);
-    }
+    for (const auto& field : type->fields) expectEntryKeyed(*field, type->name + "/" + field->name);
   }
 }
 
@@ -267,6 +247,21 @@ const Expected kRealWorld[] = {
     {kRawSettings, "ToneCurve", "seq", "text", "seq", true},
     {kAggregate, "ImageSize", "text", "", "text", true},
     {kAggregate, "PhotographicSensitivity", "text", "", "text", true},
+    // What the display formatters, fallbacks and aggregators read: they
+    // apply to internal properties and dispatch on the type id.
+    {kExif, "FocalLength", "rational", "", "text", true},
+    {kTiff, "YResolution", "rational", "", "text", true},
+    {kExifEX, "GPSHPositioningError", "rational", "", "text", true},
+    {kExifEX, "BodySerialNumber", "text", "", "text", true},
+    {kAux, "SerialNumber", "text", "", "text", true},
+    {kExifEX, "LensSerialNumber", "text", "", "text", true},
+    {kAux, "LensSerialNumber", "text", "", "text", true},
+    {kExifEX, "CameraOwnerName", "text", "", "text", true},
+    {kAux, "OwnerName", "text", "", "text", true},
+    {kExif, "PixelYDimension", "integer", "", "integer", true},
+    {kTiff, "ImageLength", "integer", "", "integer", true},
+    {kAggregate, "ImageResolution", "text", "", "text", true},
+    {kAggregate, "ShutterSpeed", "text", "", "text", true},
 };
 
 TEST(BuiltinDefinitions, RealWorldPropertiesHaveTheirPublishedTypes) {
@@ -301,58 +296,78 @@ TEST(BuiltinDefinitions, RealWorldPropertiesHaveTheirPublishedTypes) {
   }
 }
 
-std::map<std::string, FieldDefinition> FieldsOf(const TypeDefinitionPtr& type) {
-  std::map<std::string, FieldDefinition> fields;
-  if (type)
-    for (const auto& field : type->fields) fields[field->name] = *field;
-  return fields;
-}
-
 TEST(BuiltinDefinitions, StructPropertiesCarryTheirFieldsInTheirNamespaces) {
   ovratest::LibraryScope library;
-
-  auto contact = FieldsOf(PropertyTypeOf(*Property(kIptcCore, "CreatorContactInfo")));
-  for (const char* name : {"CiAdrExtadr", "CiAdrCity", "CiAdrRegion", "CiAdrPcode", "CiAdrCtry",
-                           "CiTelWork", "CiEmailWork", "CiUrlWork"}) {
-    ASSERT_EQ(contact.count(name), 1u) << name;
-    EXPECT_EQ(contact[name].namespaceURI, kIptcCore);
-    EXPECT_EQ(contact[name].prefix, "Iptc4xmpCore");
-    EXPECT_EQ(contact[name].type, boost::make_optional(UTF8String("text")));
+  auto fieldsOf = [](const char* namespaceURI, const char* name) {
+    std::map<std::string, FieldDefinition> fields;
+    if (const auto type = PropertyTypeOf(*Property(namespaceURI, name)))
+      for (const auto& field : type->fields) fields[field->name] = *field;
+    return fields;
+  };
+  const struct {
+    const char* namespaceURI;
+    const char* property;
+    std::size_t fieldCount;  // 0: not checked
+    std::vector<const char*> fields;
+  } structs[] = {
+      {kIptcCore, "CreatorContactInfo", 0,
+       {"CiAdrExtadr", "CiAdrCity", "CiAdrRegion", "CiAdrPcode", "CiAdrCtry", "CiTelWork", "CiEmailWork",
+        "CiUrlWork"}},
+      {kDM, "duration", 2, {"value", "scale"}},
+      {kDM, "markers", 0, {"startTime", "duration", "comment", "name", "type", "cuePointParams"}},
+      {kPlus, "Licensee", 2, {"LicenseeName", "LicenseeID"}},
+      {kExif, "Flash", 5, {"Fired", "Return", "Mode", "Function", "RedEyeMode"}},
+  };
+  for (const auto& s : structs) {
+    SCOPED_TRACE(s.property);
+    const auto fields = fieldsOf(s.namespaceURI, s.property);
+    if (s.fieldCount) {
+      EXPECT_EQ(fields.size(), s.fieldCount);
+    }
+    for (const char* name : s.fields) {
+      ASSERT_EQ(fields.count(name), 1u) << name;
+      EXPECT_EQ(fields.at(name).namespaceURI, s.namespaceURI) << name;
+    }
   }
-
-  auto time = FieldsOf(PropertyTypeOf(*Property(kDM, "duration")));
-  ASSERT_EQ(time.size(), 2u);
-  EXPECT_EQ(time["value"].type, boost::make_optional(UTF8String("integer")));
-  EXPECT_EQ(time["scale"].type, boost::make_optional(UTF8String("rational")));
-  EXPECT_EQ(time["scale"].namespaceURI, kDM);
-
-  auto marker = FieldsOf(PropertyTypeOf(*Property(kDM, "markers")));
-  for (const char* name : {"startTime", "duration", "comment", "name", "type", "cuePointParams"})
-    EXPECT_EQ(marker.count(name), 1u) << name;
-  EXPECT_EQ(ElementTypeIdOf(marker["cuePointParams"]), boost::make_optional(UTF8String("CuePointParam")));
-
-  auto licensee = FieldsOf(PropertyTypeOf(*Property(kPlus, "Licensee")));
-  ASSERT_EQ(licensee.size(), 2u);
-  EXPECT_EQ(licensee["LicenseeName"].namespaceURI, kPlus);
-  EXPECT_EQ(licensee["LicenseeID"].prefix, "plus");
-
-  // IPTC locations borrow the EXIF GPS fields.
-  auto location = FieldsOf(PropertyTypeOf(*Property(kIptcExt, "LocationCreated")));
-  EXPECT_EQ(location["City"].namespaceURI, kIptcExt);
-  EXPECT_EQ(location["GPSLatitude"].namespaceURI, kExif);
-  EXPECT_EQ(location["GPSLatitude"].type, boost::make_optional(UTF8String("gpscoordinate")));
-
-  auto event = FieldsOf(PropertyTypeOf(*Property(kMM, "History")));
-  EXPECT_EQ(event["when"].type, boost::make_optional(UTF8String("date")));
-  EXPECT_EQ(event["action"].prefix, "stEvt");
-  EXPECT_EQ(PrimitiveTypeOf(event["action"]), boost::make_optional(kPrimitiveType_openchoice));
-
-  auto flash = FieldsOf(PropertyTypeOf(*Property(kExif, "Flash")));
-  ASSERT_EQ(flash.size(), 5u);
-  EXPECT_EQ(flash["Return"].namespaceURI, kExif);
-  EXPECT_EQ(ElementTypeIdOf(flash["Mode"]), boost::make_optional(UTF8String("integer")));
-  EXPECT_EQ(flash["Mode"].constraints.choices.size(), 4u);
-  EXPECT_EQ(ElementTypeIdOf(flash["Fired"]), boost::make_optional(UTF8String("boolean")));
+  // Field types, element types and prefixes, including IPTC locations that
+  // borrow the EXIF GPS fields.
+  const struct {
+    const char* namespaceURI;
+    const char* property;
+    const char* field;
+    const char* fieldNamespace;
+    const char* prefix;  // null: not checked
+    const char* type;
+    const char* elementType;  // null: none
+  } fields[] = {
+      {kIptcCore, "CreatorContactInfo", "CiAdrCity", kIptcCore, "Iptc4xmpCore", "text", nullptr},
+      {kDM, "duration", "value", kDM, nullptr, "integer", nullptr},
+      {kDM, "duration", "scale", kDM, nullptr, "rational", nullptr},
+      {kDM, "markers", "cuePointParams", kDM, nullptr, "seq", "CuePointParam"},
+      {kPlus, "Licensee", "LicenseeID", kPlus, "plus", "text", nullptr},
+      {kIptcExt, "LocationCreated", "City", kIptcExt, nullptr, "text", nullptr},
+      {kIptcExt, "LocationCreated", "GPSLatitude", kExif, nullptr, "gpscoordinate", nullptr},
+      {kMM, "History", "when", nullptr, "stEvt", "date", nullptr},
+      {kMM, "History", "action", nullptr, "stEvt", "openchoice", "text"},
+      {kExif, "Flash", "Mode", kExif, nullptr, "closedchoice", "integer"},
+      {kExif, "Flash", "Fired", kExif, nullptr, "closedchoice", "boolean"},
+  };
+  for (const auto& f : fields) {
+    SCOPED_TRACE(std::string(f.property) + "/" + f.field);
+    const auto all = fieldsOf(f.namespaceURI, f.property);
+    ASSERT_EQ(all.count(f.field), 1u);
+    const FieldDefinition& field = all.at(f.field);
+    if (f.fieldNamespace) {
+      EXPECT_EQ(field.namespaceURI, f.fieldNamespace);
+    }
+    if (f.prefix) {
+      EXPECT_EQ(field.prefix, f.prefix);
+    }
+    EXPECT_EQ(field.type, boost::make_optional(UTF8String(f.type)));
+    EXPECT_EQ(ElementTypeIdOf(field), f.elementType ? boost::make_optional(UTF8String(f.elementType))
+                                                    : boost::optional<UTF8String>());
+  }
+  EXPECT_EQ(fieldsOf(kExif, "Flash")["Mode"].constraints.choices.size(), 4u);
 }
 
 std::map<std::string, std::string> ChoiceLabels(const EntryDefinition& entry) {
@@ -389,41 +404,6 @@ TEST(BuiltinDefinitions, ClosedChoicesListTheStoredValuesWithReadableLabels) {
   // A choice kind whose values may be shown in a picker must conform.
   EXPECT_TRUE(DoesElementConformToContainer(*ElementTypeIdOf(*Property(kTiff, "Orientation"))));
   EXPECT_TRUE(DoesElementConformToContainer(*ElementTypeIdOf(*Property(kDC, "title"))));
-}
-
-TEST(BuiltinDefinitions, FormattedAndAggregatedPathsAreDefinedForTheFormatters) {
-  ovratest::LibraryScope library;
-  // The display formatters apply to internal properties and dispatch on
-  // the type id, so these must be internal and typed as the values are.
-  const std::pair<const char*, const char*> rationals[] = {
-      {kExif, "ExposureTime"},     {kExif, "ShutterSpeedValue"},
-      {kExif, "FNumber"},          {kExif, "ApertureValue"},
-      {kExif, "MaxApertureValue"}, {kExif, "SubjectDistance"},
-      {kExif, "FocalLength"},      {kAux, "ApproximateFocusDistance"},
-      {kTiff, "XResolution"},      {kTiff, "YResolution"},
-      {kExifEX, "GPSHPositioningError"}};
-  for (const auto& path : rationals) {
-    const auto property = Property(path.first, path.second);
-    ASSERT_TRUE(property) << path.second;
-    EXPECT_EQ(property->type, boost::make_optional(UTF8String("rational"))) << path.second;
-    EXPECT_TRUE(property->isInternal) << path.second;
-  }
-  // Fallbacks read these; aggregators read the rest.
-  const std::pair<const char*, const char*> read[] = {
-      {kExifEX, "LensModel"},         {kAux, "Lens"},
-      {kExifEX, "BodySerialNumber"},  {kAux, "SerialNumber"},
-      {kExifEX, "LensSerialNumber"},  {kAux, "LensSerialNumber"},
-      {kExifEX, "CameraOwnerName"},   {kAux, "OwnerName"},
-      {kExifEX, "SensitivityType"},   {kExif, "PixelYDimension"},
-      {kTiff, "ImageLength"},         {kAggregate, "ImageResolution"},
-      {kAggregate, "ShutterSpeed"}};
-  for (const auto& path : read) {
-    const auto property = Property(path.first, path.second);
-    ASSERT_TRUE(property) << path.second;
-    EXPECT_TRUE(property->isInternal) << path.second;
-  }
-  // The converter's tone curve is what the built-in block list names.
-  EXPECT_TRUE(Property(StandardSchemaNamespace(kStandardSchema_rwset).c_str(), "ToneCurve"));
 }
 
 }  // namespace

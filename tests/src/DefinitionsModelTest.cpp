@@ -1,4 +1,4 @@
-#include "SrcTestSupport.h"
+#include "MetadataTestSupport.h"
 
 using namespace ovrametadata;
 

@@ -1,16 +1,17 @@
 #include <ovracore/Localizer.h>
 
-#include "SrcTestSupport.h"
+#include "MetadataTestSupport.h"
 #include "TestSupport.h"
 
 using namespace ovrametadata;
 using ovratest::ErrorsSince;
-using ovratest::ExpectError;
 using ovratest::U8;
 
 namespace {
 
 const std::u16string kSource = u"/defs/parser.xml";
+const std::string kParsing = "Error parsing definitions file: ";
+using Text = boost::optional<std::string>;
 
 std::string Document(const std::string& body) {
   return "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n"
@@ -49,12 +50,12 @@ TEST(DefinitionsParser, ReadsEveryAttributeOfSchemasPropertiesAndTypes) {
 
   const auto& rating = *schema.properties[0];
   EXPECT_EQ(rating.name, "rating");
-  EXPECT_EQ(rating.type, boost::make_optional(std::string("closedchoice")));
-  EXPECT_EQ(rating.constraints.elementType, boost::make_optional(std::string("integer")));
+  EXPECT_EQ(rating.type, Text(("closedchoice")));
+  EXPECT_EQ(rating.constraints.elementType, Text(("integer")));
   EXPECT_TRUE(rating.isInternal);
   EXPECT_EQ(rating.constraints.min, boost::make_optional(-1.0));
   EXPECT_EQ(rating.constraints.max, boost::make_optional(5.0));
-  EXPECT_EQ(rating.constraints.pattern, boost::make_optional(std::string("[0-9]")));
+  EXPECT_EQ(rating.constraints.pattern, Text(("[0-9]")));
   EXPECT_EQ(rating.constraints.deprecated, boost::make_optional(true));
   ASSERT_TRUE(rating.uiHints);
   EXPECT_FALSE(rating.uiHints->separatorAfter);
@@ -80,7 +81,7 @@ TEST(DefinitionsParser, ReadsEveryAttributeOfSchemasPropertiesAndTypes) {
   ASSERT_EQ(point.fields.size(), 1u);
   EXPECT_EQ(point.fields[0]->namespaceURI, "http://example.com/pt/");
   EXPECT_EQ(point.fields[0]->prefix, "pt");
-  EXPECT_EQ(point.fields[0]->type, boost::make_optional(std::string("real")));
+  EXPECT_EQ(point.fields[0]->type, Text(("real")));
 }
 
 TEST(DefinitionsParser, LabelsAreLocalisedAndTheirSourcesKept) {
@@ -152,16 +153,10 @@ TEST(DefinitionsParser, MisplacedElementsAreReportedAndDropped) {
                                                 kSource);
   ASSERT_EQ(result.first.size(), 1u);
   EXPECT_TRUE(result.first[0]->properties.empty());
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 6u);
-  const std::string prefix = "Error parsing definitions file: ";
-  ExpectError(errors[0], kDefinitionParsingError, prefix + "invalid property tag \"early\".", kSource);
-  ExpectError(errors[1], kDefinitionParsingError, prefix + "invalid property tag \"sep\".", kSource);
-  ExpectError(errors[2], kDefinitionParsingError, prefix + "invalid choice tag.", kSource);
-  ExpectError(errors[3], kDefinitionParsingError, prefix + "invalid qualifier tag.", kSource);
-  ExpectError(errors[4], kDefinitionParsingError, prefix + "invalid field tag \"orphan\".", kSource);
-  ExpectError(errors[5], kDefinitionParsingError,
-              prefix + "invalid definitions tag \"xmp_unknown\".", kSource);
+  since.Expect(kDefinitionParsingError, kSource,
+               {kParsing + "invalid property tag \"early\".", kParsing + "invalid property tag \"sep\".",
+                kParsing + "invalid choice tag.", kParsing + "invalid qualifier tag.",
+                kParsing + "invalid field tag \"orphan\".", kParsing + "invalid definitions tag \"xmp_unknown\"."});
 }
 
 TEST(DefinitionsParser, DeprecatedAndExtendsRules) {
@@ -181,10 +176,7 @@ TEST(DefinitionsParser, DeprecatedAndExtendsRules) {
   EXPECT_FALSE(result.second[3]->extends);
   EXPECT_EQ(result.second[4]->extends, boost::make_optional(kPrimitiveType_seq));
   EXPECT_FALSE(result.second[5]->extends);
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 1u);
-  ExpectError(errors[0], kDefinitionParsingError,
-              "Error parsing definitions file: Entry must extend valid primitive type", u"");
+  since.Expect(kDefinitionParsingError, u"", {kParsing + "Entry must extend valid primitive type"});
 }
 
 TEST(DefinitionsParser, MisspeltRootIsReportedAndItsChildrenRead) {
@@ -193,9 +185,7 @@ TEST(DefinitionsParser, MisspeltRootIsReportedAndItsChildrenRead) {
       R"(<xmp_definition><xmp_type name="kept"/></xmp_definition>)", kSource);
   ASSERT_EQ(result.second.size(), 1u);
   EXPECT_EQ(result.second[0]->name, "kept");
-  ASSERT_EQ(since.Texts(), std::vector<std::string>{
-                               "Error parsing definitions file: invalid definitions tag "
-                               "\"xmp_definition\"."});
+  since.Expect(kDefinitionParsingError, kSource, {kParsing + "invalid definitions tag \"xmp_definition\"."});
 }
 
 TEST(DefinitionsParser, MalformedDocumentKeepsWhatCameBefore) {
@@ -206,15 +196,11 @@ TEST(DefinitionsParser, MalformedDocumentKeepsWhatCameBefore) {
       kSource);
   ASSERT_EQ(result.second.size(), 2u);
   EXPECT_EQ(result.second[1]->name, "broken");
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 1u);
-  ExpectError(errors[0], kDefinitionParsingError, "Error parsing definitions file: invalid XML.",
-              kSource);
+  since.Expect(kDefinitionParsingError, kSource, {kParsing + "invalid XML."});
 
   ErrorsSince empty;
   EXPECT_TRUE(ParseBufferForDefinitions("", u"empty").second.empty());
-  ASSERT_EQ(empty.New().size(), 1u);
-  EXPECT_EQ(U8(empty.New()[0].source), "empty");
+  empty.Expect(kDefinitionParsingError, u"empty", {kParsing + "invalid XML."});
 }
 
 TEST(DefinitionsParser, DocumentsAreReadFromFiles) {
@@ -230,10 +216,7 @@ TEST(DefinitionsParser, DocumentsAreReadFromFiles) {
   const std::u16string missing = ovratest::U16((dir / "missing.xml").string());
   DefinitionsPair none;
   EXPECT_FALSE(ParseDocumentForDefinitions(missing, none));
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 1u);
-  ExpectError(errors[0], kDefinitionParsingError, "Error parsing definitions file: invalid XML.",
-              missing);
+  since.Expect(kDefinitionParsingError, missing, {kParsing + "invalid XML."});
 }
 
 class ParseAndRegister : public ::testing::Test {
@@ -258,12 +241,8 @@ TEST_F(ParseAndRegister, TypesRegisterBeforeSchemasAndChecksRunAfterwards) {
   EXPECT_EQ(result.second.size(), 2u);
   EXPECT_TRUE(NamespaceDefinition("http://example.com/order/"));
   EXPECT_TRUE(TypeIdDefinition("ordLater"));
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 1u);
-  ExpectError(errors[0], kDefinitionRegistrationError,
-              "Error registering definition: XMP property \"ord:bad\" has an invalid type "
-              "\"ordNothing\".",
-              kSource);
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {"Error registering definition: XMP property \"ord:bad\" has an invalid type \"ordNothing\"."});
 }
 
 TEST_F(ParseAndRegister, DuplicatesEmptyTheReturnedListsButKeepWhatRegistered) {
@@ -282,9 +261,8 @@ TEST_F(ParseAndRegister, DuplicatesEmptyTheReturnedListsButKeepWhatRegistered) {
   EXPECT_TRUE(TypeIdDefinition("dupAlso"));
   ASSERT_EQ(result.first.size(), 1u);
   // The field check is skipped when the types did not all register.
-  EXPECT_EQ(since.Texts(), std::vector<std::string>{
-                               "Error registering definition: type definition for \"dupTaken\" "
-                               "already exists."});
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {"Error registering definition: type definition for \"dupTaken\" already exists."});
 
   ErrorsSince again;
   const auto repeated = ParseBufferAndRegisterDefinitions(

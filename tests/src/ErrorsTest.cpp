@@ -2,7 +2,7 @@
 #include <set>
 #include <thread>
 
-#include "SrcTestSupport.h"
+#include "MetadataTestSupport.h"
 
 using namespace ovrametadata;
 using ovratest::ErrorsSince;
@@ -15,10 +15,7 @@ TEST(ErrorReporting, PlainErrorKeepsTheMessageAsItStands) {
   SendError(kPlainError, u"abc", u"");
   // Text that looks like a key or a placeholder is not interpreted.
   SendError(kPlainError, u"$$$/ovrametadata/x=y @0 #{quot}", u"");
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 2u);
-  ovratest::ExpectError(errors[0], kPlainError, "abc", u"");
-  ovratest::ExpectError(errors[1], kPlainError, "$$$/ovrametadata/x=y @0 #{quot}", u"");
+  since.Expect(kPlainError, u"", {"abc", "$$$/ovrametadata/x=y @0 #{quot}"});
   EXPECT_TRUE(HasErrors());
 }
 
@@ -38,55 +35,43 @@ TEST(ErrorReporting, EveryTypeUsesItsLocalisedFormat) {
   const auto errors = since.New();
   ASSERT_EQ(errors.size(), std::size(formats));
   for (std::size_t i = 0; i < errors.size(); ++i) {
-    ovratest::ExpectError(errors[i], formats[i].first, formats[i].second, u"/tmp/defs.xml");
+    EXPECT_EQ(errors[i].type, formats[i].first);
+    EXPECT_EQ(U8(errors[i].message), formats[i].second);
+    EXPECT_EQ(U8(errors[i].source), "/tmp/defs.xml");
   }
 }
 
 TEST(ErrorReporting, UnknownTypeRecordsAnEmptyText) {
   ErrorsSince since;
   SendError(static_cast<ErrorType>(9), u"lost", u"src");
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 1u);
-  EXPECT_TRUE(errors[0].message.empty());
-  EXPECT_EQ(U8(errors[0].source), "src");
+  since.Expect(static_cast<ErrorType>(9), u"src", {""});
 }
 
-TEST(ErrorCallbacks, ReceiveTheTextWithoutTheSourceAndMayReadTheList) {
+TEST(ErrorCallbacks, ReceiveTheTextMayReadTheListAndAreDroppedOnceCleared) {
   std::vector<std::u16string> received;
   std::size_t listSizeSeen = 0;
-  auto callback = boost::make_shared<ErrorCallback>([&](const std::u16string& text) {
+  int secondCalls = 0;
+  auto first = boost::make_shared<ErrorCallback>([&](const std::u16string& text) {
     received.push_back(text);
     // Would deadlock if callbacks ran under the error lock.
     listSizeSeen = GetErrorInfos().size();
   });
-  NotifyOnError(callback);
-  ErrorsSince since;
-  SendError(kDefinitionParsingError, u"x", u"/data/file.xml");
-  callback->clear();
-
-  ASSERT_EQ(received.size(), 1u);
-  EXPECT_EQ(U8(received[0]), "Error parsing definitions file: x");
-  EXPECT_EQ(listSizeSeen, GetErrorInfos().size());
-  ASSERT_EQ(since.New().size(), 1u);
-  EXPECT_EQ(U8(since.New()[0].source), "/data/file.xml");
-}
-
-TEST(ErrorCallbacks, ClearedCallbackIsSkippedAndDroppedOnTheNextRegistration) {
-  int firstCalls = 0;
-  int secondCalls = 0;
-  auto first = boost::make_shared<ErrorCallback>([&](const std::u16string&) { ++firstCalls; });
   auto second = boost::make_shared<ErrorCallback>([&](const std::u16string&) { ++secondCalls; });
   NotifyOnError(first);
-  SendError(kPlainError, u"one", u"");
+  ErrorsSince since;
+  SendError(kDefinitionParsingError, u"x", u"/data/file.xml");
+  EXPECT_EQ(listSizeSeen, GetErrorInfos().size());
+  since.Expect(kDefinitionParsingError, u"/data/file.xml", {"Error parsing definitions file: x"});
   first->clear();
   SendError(kPlainError, u"two", u"");
-  EXPECT_EQ(firstCalls, 1);
+  // The callback gets the text without the source.
+  EXPECT_EQ(received, std::vector<std::u16string>{u"Error parsing definitions file: x"});
 
   const long heldBefore = first.use_count();
   NotifyOnError(second);
   EXPECT_EQ(first.use_count(), heldBefore - 1) << "the cleared entry is still kept";
   SendError(kPlainError, u"three", u"");
-  EXPECT_EQ(firstCalls, 1);
+  EXPECT_EQ(received.size(), 1u);
   EXPECT_EQ(secondCalls, 1);
   second->clear();
 }

@@ -3,7 +3,7 @@
 
 #include <ovracore/FileSupport.h>
 
-#include "SrcTestSupport.h"
+#include "MetadataTestSupport.h"
 #include "TestSupport.h"
 
 using namespace ovrametadata;
@@ -14,20 +14,6 @@ namespace {
 std::u16string Expected(const char* rootVariable, const std::string& relative) {
   return ovratest::U16((fs::path(std::getenv(rootVariable)) / relative).lexically_normal().string());
 }
-
-// Sets an environment variable for the lifetime of the object.
-class ScopedEnv {
- public:
-  ScopedEnv(const char* name, const char* value) : mName(name) {
-    if (const char* old = std::getenv(name)) mOld = old;
-    setenv(name, value, 1);
-  }
-  ~ScopedEnv() { setenv(mName, mOld.c_str(), 1); }
-
- private:
-  const char* mName;
-  std::string mOld;
-};
 
 TEST(Folders, CustomDefinitionFoldersDifferOnlyInTheRoot) {
   const std::string relative = "Orlex/XMP/Custom Propsheet Panels/4.0/custom";
@@ -41,20 +27,18 @@ TEST(Folders, CustomDefinitionFoldersDifferOnlyInTheRoot) {
 
 TEST(Folders, PanelFoldersFollowTheLayoutVersion) {
   const std::string base = "Orlex/XMP/Custom Propsheet Panels/";
-  EXPECT_EQ(PanelsDefinitionsUserDirectory(kPanelsVersion4),
-            Expected("OVRAMETADATA_USER_ROOT", base + "4.0/panels"));
-  EXPECT_EQ(PanelsDefinitionsUserDirectory(kPanelsVersion3),
-            Expected("OVRAMETADATA_USER_ROOT", base + "3.0/panels"));
-  EXPECT_EQ(PanelsDefinitionsUserDirectory(kPanelsVersion2),
-            Expected("OVRAMETADATA_USER_ROOT", base + "2.0/panels"));
-  EXPECT_EQ(PanelsDefinitionsUserDirectory(static_cast<VelkVersion>(7)),
-            Expected("OVRAMETADATA_USER_ROOT", base + "2.0/panels"));
-  EXPECT_EQ(PanelsDefinitionsGlobalDirectory(kPanelsVersion3),
-            Expected("OVRAMETADATA_LOCAL_ROOT", base + "3.0/panels"));
+  const std::pair<VelkVersion, const char*> versions[] = {{kPanelsVersion4, "4.0/panels"},
+                                                          {kPanelsVersion3, "3.0/panels"},
+                                                          {kPanelsVersion2, "2.0/panels"},
+                                                          {static_cast<VelkVersion>(7), "2.0/panels"}};
+  for (const auto& [version, folder] : versions) {
+    EXPECT_EQ(PanelsDefinitionsUserDirectory(version), Expected("OVRAMETADATA_USER_ROOT", base + folder));
+    EXPECT_EQ(PanelsDefinitionsGlobalDirectory(version), Expected("OVRAMETADATA_LOCAL_ROOT", base + folder));
+  }
 }
 
 TEST(Folders, UnusableRootGivesEmptyPaths) {
-  ScopedEnv noUserRoot("OVRAMETADATA_USER_ROOT", "");
+  ovratest::ScopedEnv noUserRoot("OVRAMETADATA_USER_ROOT", "");
   EXPECT_TRUE(CustomDefinitionsUserDirectory().empty());
   EXPECT_TRUE(PanelsDefinitionsUserDirectory(kPanelsVersion4).empty());
   EXPECT_FALSE(CustomDefinitionsGlobalDirectory().empty());

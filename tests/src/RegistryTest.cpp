@@ -1,15 +1,16 @@
-#include "SrcTestSupport.h"
+#include "MetadataTestSupport.h"
 
 using namespace ovrametadata;
 using ovratest::ErrorsSince;
-using ovratest::ExpectError;
 
 namespace {
 
 const std::u16string kSource = u"/defs/test.xml";
+const std::string kRegistering = "Error registering definition: ";
+using Text = boost::optional<std::string>;
 
 TypeDefinitionPtr NewType(const std::string& name, boost::optional<PrimitiveType> extends = boost::none,
-                          boost::optional<std::string> elementType = boost::none) {
+                          Text elementType = boost::none) {
   auto type = boost::make_shared<TypeDefinition>();
   type->name = name;
   type->extends = extends;
@@ -18,8 +19,7 @@ TypeDefinitionPtr NewType(const std::string& name, boost::optional<PrimitiveType
 }
 
 boost::shared_ptr<FieldDefinition> NewField(const std::string& name, const std::string& ns,
-                                            const std::string& prefix,
-                                            boost::optional<std::string> type) {
+                                            const std::string& prefix, Text type) {
   auto field = boost::make_shared<FieldDefinition>();
   field->name = name;
   field->namespaceURI = ns;
@@ -28,8 +28,7 @@ boost::shared_ptr<FieldDefinition> NewField(const std::string& name, const std::
   return field;
 }
 
-PropertyDefinitionPtr NewProperty(const std::string& name, boost::optional<std::string> type,
-                                  boost::optional<std::string> elementType = boost::none) {
+PropertyDefinitionPtr NewProperty(const std::string& name, Text type, Text elementType = boost::none) {
   auto property = boost::make_shared<PropertyDefinition>();
   property->name = name;
   property->type = type;
@@ -52,9 +51,7 @@ class Registry : public ::testing::Test {
 TEST(RegistryLifecycle, AnswersNothingWhileNotInitialised) {
   ErrorsSince since;
   EXPECT_FALSE(RegisterTypeDefinition(NewType("lonely"), kSource));
-  EXPECT_FALSE(RegisterSchemaDefinition(NewSchema("http://example.com/lonely/", "lonely"),
-                                        kSource, false));
-  EXPECT_FALSE(TypeIdDefinition("text"));
+  EXPECT_FALSE(RegisterSchemaDefinition(NewSchema("http://example.com/lonely/", "lonely"), kSource, false));
   EXPECT_FALSE(NamespaceDefinition("http://purl.org/dc/elements/1.1/"));
   EXPECT_TRUE(StandardSchemaNamespace(kStandardSchema_dc).empty());
   EXPECT_TRUE(CommonSchemaDefinitions().empty());
@@ -68,17 +65,13 @@ TEST(RegistryLifecycle, AnswersNothingWhileNotInitialised) {
 
 TEST_F(Registry, DuplicateTypeIsReportedAndTheFirstKept) {
   const auto first = NewType("rType");
-  const auto second = NewType("rType");
   EXPECT_TRUE(RegisterTypeDefinition(first, kSource));
-  EXPECT_EQ(first->type, boost::make_optional(std::string("rType")));
+  EXPECT_EQ(first->type, Text("rType"));
   ErrorsSince since;
-  EXPECT_FALSE(RegisterTypeDefinition(second, kSource));
+  EXPECT_FALSE(RegisterTypeDefinition(NewType("rType"), kSource));
   EXPECT_EQ(TypeIdDefinition("rType"), first);
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 1u);
-  ExpectError(errors[0], kDefinitionRegistrationError,
-              "Error registering definition: type definition for \"rType\" already exists.",
-              kSource);
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {kRegistering + "type definition for \"rType\" already exists."});
   EXPECT_FALSE(RegisterTypeDefinition(TypeDefinitionPtr(), kSource));
 }
 
@@ -86,18 +79,14 @@ TEST_F(Registry, ArrayTypeWithoutElementTypeBecomesText) {
   ErrorsSince since;
   const auto list = NewType("myList", kPrimitiveType_bag);
   EXPECT_TRUE(RegisterTypeDefinition(list, kSource));
-  EXPECT_EQ(list->constraints.elementType, boost::make_optional(std::string("text")));
-  const auto errors = since.New();
-  ASSERT_EQ(errors.size(), 1u);
-  ExpectError(errors[0], kDefinitionRegistrationError,
-              "Error registering definition: invalid element type for type \"myList\" is changed "
-              "to default type 'text'.",
-              kSource);
+  EXPECT_EQ(list->constraints.elementType, Text("text"));
   // Structs are left alone even when they extend an array kind.
   const auto structType = NewType("myStructList", kPrimitiveType_seq);
   structType->fields.push_back(NewField("f", "http://example.com/rf/", "rf", std::string("text")));
   EXPECT_TRUE(RegisterTypeDefinition(structType, kSource));
   EXPECT_FALSE(structType->constraints.elementType);
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {kRegistering + "invalid element type for type \"myList\" is changed to default type 'text'."});
 }
 
 TEST_F(Registry, FieldsAreRepairedAndTheirNamespacesRegistered) {
@@ -106,14 +95,12 @@ TEST_F(Registry, FieldsAreRepairedAndTheirNamespacesRegistered) {
   type->fields.push_back(NewField("untyped", "http://example.com/rfield/", "rfield", boost::none));
   type->fields.push_back(NewField("list", "http://example.com/rfield/", "rfield", std::string("bag")));
   EXPECT_TRUE(RegisterTypeDefinition(type, kSource));
-  EXPECT_EQ(type->fields[0]->type, boost::make_optional(std::string("text")));
-  EXPECT_EQ(type->fields[1]->constraints.elementType, boost::make_optional(std::string("text")));
-  EXPECT_EQ(since.Texts(),
-            (std::vector<std::string>{
-                "Error registering definition: invalid type for XMP property \"rfield:untyped\" "
-                "is changed to default type 'text'.",
-                "Error registering definition: invalid element type for XMP property "
-                "\"rfield:list\" is changed to default type 'text'."}));
+  EXPECT_EQ(type->fields[0]->type, Text("text"));
+  EXPECT_EQ(type->fields[1]->constraints.elementType, Text("text"));
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {kRegistering + "invalid type for XMP property \"rfield:untyped\" is changed to default type 'text'.",
+                kRegistering + "invalid element type for XMP property \"rfield:list\" is changed to default "
+                               "type 'text'."});
 }
 
 TEST_F(Registry, TypeWhoseFieldNamespaceFailsIsRemovedAgain) {
@@ -124,13 +111,10 @@ TEST_F(Registry, TypeWhoseFieldNamespaceFailsIsRemovedAgain) {
   type->fields.push_back(NewField("bad2", "http://example.com/rbad2/", "2bad", std::string("text")));
   EXPECT_FALSE(RegisterTypeDefinition(type, kSource));
   EXPECT_FALSE(TypeIdDefinition("rBroken"));
-  EXPECT_EQ(since.Texts(),
-            (std::vector<std::string>{
-                "Error registering definition: namespace \"\" couldn't be registered with prefix "
-                "\"rbad\".",
-                "Error registering definition: namespace \"http://example.com/rbad2/\" couldn't be "
-                "registered with prefix \"2bad\".",
-                "Error registering definition: invalid Type \"rBroken\"."}));
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {kRegistering + "namespace \"\" couldn't be registered with prefix \"rbad\".",
+                kRegistering + "namespace \"http://example.com/rbad2/\" couldn't be registered with prefix \"2bad\".",
+                kRegistering + "invalid Type \"rBroken\"."});
 }
 
 TEST_F(Registry, DuplicateSchemaIsReportedOrMerged) {
@@ -140,77 +124,59 @@ TEST_F(Registry, DuplicateSchemaIsReportedOrMerged) {
   EXPECT_TRUE(IsSchemaDefinitionAlreadyRegistered(NewSchema(ns, "other")));
 
   ErrorsSince since;
-  const auto again = NewSchema(ns, "rdup", {NewProperty("b", std::string("text"))});
-  EXPECT_FALSE(RegisterSchemaDefinition(again, kSource, false));
-  ASSERT_EQ(since.New().size(), 1u);
-  ExpectError(since.New()[0], kDefinitionRegistrationError,
-              "Error registering definition: schema definition for \"http://example.com/rdup/\" "
-              "already exists.",
-              kSource);
+  EXPECT_FALSE(RegisterSchemaDefinition(NewSchema(ns, "rdup", {NewProperty("b", std::string("text"))}),
+                                        kSource, false));
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {kRegistering + "schema definition for \"http://example.com/rdup/\" already exists."});
   EXPECT_EQ(first->properties.size(), 1u);
 
   ErrorsSince mergeErrors;
-  const auto extra = NewSchema(ns, "rdup",
-                               {NewProperty("a", std::string("integer")),
-                                NewProperty("c", boost::none)});
+  const auto extra =
+      NewSchema(ns, "rdup", {NewProperty("a", std::string("integer")), NewProperty("c", boost::none)});
   // False although "c" merged: the merged schema is not a new one.
   EXPECT_FALSE(RegisterSchemaDefinition(extra, u"/defs/extension.xml", true));
   EXPECT_EQ(NamespaceDefinition(ns), first);
   ASSERT_EQ(first->properties.size(), 2u);
-  EXPECT_EQ(first->properties[0]->type, boost::make_optional(std::string("text")));
+  EXPECT_EQ(first->properties[0]->type, Text("text"));
   EXPECT_EQ(first->properties[1]->name, "c");
-  EXPECT_EQ(first->properties[1]->type, boost::make_optional(std::string("text")));
-  const auto errors = mergeErrors.New();
-  ASSERT_EQ(errors.size(), 2u);
-  ExpectError(errors[0], kDefinitionRegistrationError,
-              "Error registering definition: property definition for namespace "
-              "\"http://example.com/rdup/a\" already exists.",
-              u"/defs/extension.xml");
-  ExpectError(errors[1], kDefinitionRegistrationError,
-              "Error registering definition: invalid type for XMP property \"rdup:c\" is changed "
-              "to default type 'text'.",
-              u"/defs/extension.xml");
+  EXPECT_EQ(first->properties[1]->type, Text("text"));
+  mergeErrors.Expect(
+      kDefinitionRegistrationError, u"/defs/extension.xml",
+      {kRegistering + "property definition for namespace \"http://example.com/rdup/a\" already exists.",
+       kRegistering + "invalid type for XMP property \"rdup:c\" is changed to default type 'text'."});
 }
 
 TEST_F(Registry, TakenPrefixIsReportedButTheSchemaStays) {
-  EXPECT_TRUE(RegisterSchemaDefinition(NewSchema("http://example.com/rtaken1/", "rtaken"),
-                                       kSource, false));
+  EXPECT_TRUE(RegisterSchemaDefinition(NewSchema("http://example.com/rtaken1/", "rtaken"), kSource, false));
   ErrorsSince since;
   const auto second = NewSchema("http://example.com/rtaken2/", "rtaken");
   EXPECT_TRUE(RegisterSchemaDefinition(second, kSource, false));
   EXPECT_EQ(NamespaceDefinition("http://example.com/rtaken2/"), second);
-  ASSERT_EQ(since.New().size(), 1u);
-  ExpectError(since.New()[0], kDefinitionRegistrationError,
-              "Error registering definition: namespace \"http://example.com/rtaken2/\" couldn't "
-              "be registered with prefix \"rtaken\".",
-              kSource);
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {kRegistering + "namespace \"http://example.com/rtaken2/\" couldn't be registered with prefix "
+                               "\"rtaken\"."});
 }
 
 TEST_F(Registry, PropertiesWithoutTypeOrElementTypeAreRepaired) {
   ErrorsSince since;
   const auto schema = NewSchema("http://example.com/rfix/", "rfix",
-                                {NewProperty("plain", boost::none),
-                                 NewProperty("tags", std::string("bag")),
+                                {NewProperty("plain", boost::none), NewProperty("tags", std::string("bag")),
                                  NewProperty("ids", std::string("seq"), std::string("integer")),
                                  NewProperty("list", std::string("myFixList"))});
   RegisterTypeDefinition(NewType("myFixList", kPrimitiveType_seq, std::string("real")), kSource);
   EXPECT_TRUE(RegisterSchemaDefinition(schema, kSource, false));
-  EXPECT_EQ(schema->properties[0]->type, boost::make_optional(std::string("text")));
-  EXPECT_EQ(schema->properties[1]->constraints.elementType,
-            boost::make_optional(std::string("text")));
-  EXPECT_EQ(schema->properties[2]->constraints.elementType,
-            boost::make_optional(std::string("integer")));
+  EXPECT_EQ(schema->properties[0]->type, Text("text"));
+  EXPECT_EQ(schema->properties[1]->constraints.elementType, Text("text"));
+  EXPECT_EQ(schema->properties[2]->constraints.elementType, Text("integer"));
   // The registered type carries the element type; the property needs none.
   EXPECT_FALSE(schema->properties[3]->constraints.elementType);
-  EXPECT_EQ(since.Texts(),
-            (std::vector<std::string>{
-                "Error registering definition: invalid type for XMP property \"rfix:plain\" is "
-                "changed to default type 'text'.",
-                "Error registering definition: invalid element type for XMP property "
-                "\"rfix:tags\" is changed to default type 'text'."}));
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {kRegistering + "invalid type for XMP property \"rfix:plain\" is changed to default type 'text'.",
+                kRegistering + "invalid element type for XMP property \"rfix:tags\" is changed to default "
+                               "type 'text'."});
 }
 
-TEST_F(Registry, RemovalGoesByKey) {
+TEST_F(Registry, RemovalGoesByKeyAndLookupFindsTheFirstOfAName) {
   const auto registered = NewType("rRemovable");
   ASSERT_TRUE(RegisterTypeDefinition(registered, kSource));
   EXPECT_TRUE(RemoveTypeDefinition(NewType("rRemovable")));
@@ -218,7 +184,13 @@ TEST_F(Registry, RemovalGoesByKey) {
   EXPECT_FALSE(RemoveTypeDefinition(registered));
   EXPECT_FALSE(RemoveTypeDefinition(TypeDefinitionPtr()));
 
-  const auto schema = NewSchema("http://example.com/rremove/", "rremove");
+  const auto first = NewProperty("dup", std::string("text"));
+  const auto schema = NewSchema("http://example.com/rremove/", "rremove",
+                                {NewProperty("a", std::string("text")), first,
+                                 NewProperty("dup", std::string("integer"))});
+  EXPECT_EQ(PropertyNameDefinition(schema, "dup"), first);
+  EXPECT_FALSE(PropertyNameDefinition(schema, "missing"));
+  EXPECT_FALSE(PropertyNameDefinition(SchemaDefinitionPtr(), "a"));
   ASSERT_TRUE(RegisterSchemaDefinition(schema, kSource, false));
   EXPECT_TRUE(RemoveSchemaDefinition(NewSchema("http://example.com/rremove/", "x")));
   EXPECT_FALSE(NamespaceDefinition("http://example.com/rremove/"));
@@ -227,43 +199,24 @@ TEST_F(Registry, RemovalGoesByKey) {
   EXPECT_TRUE(RegisterSchemaDefinition(schema, kSource, false));
 }
 
-TEST_F(Registry, PropertyLookupFindsTheFirstOfAName) {
-  const auto first = NewProperty("dup", std::string("text"));
-  const auto schema = NewSchema("http://example.com/rlookup/", "rlookup",
-                                {NewProperty("a", std::string("text")), first,
-                                 NewProperty("dup", std::string("integer"))});
-  EXPECT_EQ(PropertyNameDefinition(schema, "dup"), first);
-  EXPECT_FALSE(PropertyNameDefinition(schema, "missing"));
-  EXPECT_FALSE(PropertyNameDefinition(SchemaDefinitionPtr(), "a"));
-}
-
 TEST_F(Registry, ChecksReportUnknownTypesAndChangeNothing) {
   ErrorsSince since;
-  const std::vector<SchemaDefinitionPtr> schemas = {NewSchema(
-      "http://example.com/rcheck/", "rcheck",
-      {NewProperty("ok", std::string("text")), NewProperty("odd", std::string("noSuchType")),
-       NewProperty("list", std::string("seq"), std::string("noSuchElement")),
-       NewProperty("untyped", boost::none)})};
+  const std::vector<SchemaDefinitionPtr> schemas = {
+      NewSchema("http://example.com/rcheck/", "rcheck",
+                {NewProperty("ok", std::string("text")), NewProperty("odd", std::string("noSuchType")),
+                 NewProperty("list", std::string("seq"), std::string("noSuchElement")),
+                 NewProperty("untyped", boost::none)})};
   EXPECT_TRUE(CheckPropertyTypes(schemas, kSource));
-
   const auto structType = NewType("rCheckStruct");
-  structType->fields.push_back(
-      NewField("f", "http://example.com/rcheckf/", "rcf", std::string("missingFieldType")));
-  const std::vector<TypeDefinitionPtr> types = {
-      structType, NewType("rCheckList", kPrimitiveType_alt, std::string("missingElement")),
-      NewType("rCheckFine", kPrimitiveType_alt, std::string("integer"))};
-  EXPECT_TRUE(CheckFieldTypes(types, kSource));
-
-  EXPECT_EQ(since.Texts(),
-            (std::vector<std::string>{
-                "Error registering definition: XMP property \"rcheck:odd\" has an invalid type "
-                "\"noSuchType\".",
-                "Error registering definition: XMP property \"rcheck:list\" has an invalid "
-                "element type \"noSuchElement\".",
-                "Error registering definition: XMP property \"rcf:f\" has an invalid type "
-                "\"missingFieldType\".",
-                "Error registering definition: XMP type \"rCheckList\" has an invalid element "
-                "type \"missingElement\"."}));
+  structType->fields.push_back(NewField("f", "http://example.com/rcheckf/", "rcf", std::string("missingFieldType")));
+  EXPECT_TRUE(CheckFieldTypes({structType, NewType("rCheckList", kPrimitiveType_alt, std::string("missingElement")),
+                               NewType("rCheckFine", kPrimitiveType_alt, std::string("integer"))},
+                              kSource));
+  since.Expect(kDefinitionRegistrationError, kSource,
+               {kRegistering + "XMP property \"rcheck:odd\" has an invalid type \"noSuchType\".",
+                kRegistering + "XMP property \"rcheck:list\" has an invalid element type \"noSuchElement\".",
+                kRegistering + "XMP property \"rcf:f\" has an invalid type \"missingFieldType\".",
+                kRegistering + "XMP type \"rCheckList\" has an invalid element type \"missingElement\"."});
   EXPECT_FALSE(schemas[0]->properties[3]->type);
 }
 
@@ -291,18 +244,22 @@ TEST_F(Registry, SourceFilesAreLookedUpByExactPath) {
 }
 
 TEST_F(Registry, TypeIdQueriesConsultRegisteredTypes) {
-  ASSERT_TRUE(RegisterTypeDefinition(NewType("rRating", kPrimitiveType_integer), kSource));
-  ASSERT_TRUE(RegisterTypeDefinition(
-      NewType("rMode", kPrimitiveType_closedchoice, std::string("rRating")), kSource));
-  ASSERT_TRUE(RegisterTypeDefinition(
-      NewType("rNested", kPrimitiveType_openchoice, std::string("bag")), kSource));
-  ASSERT_TRUE(RegisterTypeDefinition(
-      NewType("rKeywords", kPrimitiveType_bag, std::string("rRating")), kSource));
-  // Choices naming each other must not recurse for ever.
-  ASSERT_TRUE(RegisterTypeDefinition(
-      NewType("rCycleA", kPrimitiveType_openchoice, std::string("rCycleB")), kSource));
-  ASSERT_TRUE(RegisterTypeDefinition(
-      NewType("rCycleB", kPrimitiveType_openchoice, std::string("rCycleA")), kSource));
+  const struct {
+    const char* name;
+    PrimitiveType extends;
+    const char* elementType;
+  } types[] = {
+      {"rRating", kPrimitiveType_integer, nullptr},
+      {"rMode", kPrimitiveType_closedchoice, "rRating"},
+      {"rNested", kPrimitiveType_openchoice, "bag"},
+      {"rKeywords", kPrimitiveType_bag, "rRating"},
+      // Choices naming each other must not recurse for ever.
+      {"rCycleA", kPrimitiveType_openchoice, "rCycleB"},
+      {"rCycleB", kPrimitiveType_openchoice, "rCycleA"},
+  };
+  for (const auto& t : types)
+    ASSERT_TRUE(RegisterTypeDefinition(NewType(t.name, t.extends, t.elementType ? Text(t.elementType) : Text()),
+                                       kSource));
 
   EXPECT_EQ(PrimitiveTypeOf("rMode"), boost::make_optional(kPrimitiveType_closedchoice));
   EXPECT_TRUE(IsSimpleType("rRating"));
@@ -313,7 +270,7 @@ TEST_F(Registry, TypeIdQueriesConsultRegisteredTypes) {
   EXPECT_TRUE(IsArrayType("rKeywords"));
   EXPECT_TRUE(IsStructType("noSuchType"));
   EXPECT_FALSE(IsStructType("rKeywords"));
-  EXPECT_EQ(ElementTypeIdOf("rKeywords"), boost::make_optional(std::string("rRating")));
+  EXPECT_EQ(ElementTypeIdOf("rKeywords"), Text("rRating"));
   EXPECT_FALSE(ElementTypeIdOf("rRating"));
   EXPECT_FALSE(ElementTypeIdOf("noSuchType"));
 

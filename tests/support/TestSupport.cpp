@@ -1,6 +1,7 @@
 #include "TestSupport.h"
 
 #include <atomic>
+#include <cstdlib>
 #include <fstream>
 #include <sstream>
 #include <stdexcept>
@@ -18,6 +19,23 @@ TempDir::TempDir() {
 TempDir::~TempDir() {
   std::error_code ec;
   fs::remove_all(mPath, ec);
+}
+
+ScopedEnv::ScopedEnv(const char* name, const char* value) : mName(name) {
+  if (const char* old = std::getenv(name)) mOld = old;
+  if (value) {
+    setenv(name, value, 1);
+  } else {
+    unsetenv(name);
+  }
+}
+
+ScopedEnv::~ScopedEnv() {
+  if (mOld) {
+    setenv(mName, mOld->c_str(), 1);
+  } else {
+    unsetenv(mName);
+  }
 }
 
 std::string ReadFile(const fs::path& path) {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <filesystem>
+#include <optional>
 #include <string>
 
 namespace ovratest {
@@ -19,6 +20,19 @@ class TempDir {
 
  private:
   std::filesystem::path mPath;
+};
+
+// Sets (or, for null, unsets) an environment variable for one scope.
+class ScopedEnv {
+ public:
+  ScopedEnv(const char* name, const char* value);
+  ~ScopedEnv();
+  ScopedEnv(const ScopedEnv&) = delete;
+  ScopedEnv& operator=(const ScopedEnv&) = delete;
+
+ private:
+  const char* mName;
+  std::optional<std::string> mOld;
 };
 
 // The temporary root of this test process (its user and local data roots
