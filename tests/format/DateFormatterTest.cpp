@@ -54,63 +54,47 @@ class PinnedLocaleAndZone {
   std::string mZone;
 };
 
-TEST(FormatDate, DateTimeWithZoneIsShownInLocalTime) {
-  PinnedLocaleAndZone pin("en_US", "UTC");
-  EXPECT_EQ("Jan 5, 2024, 3:04:05" + kNNBSP + "PM", FormatDate("2024-01-05T15:04:05Z"));
-  // A five-hour negative offset is moved to UTC first.
-  EXPECT_EQ("Jan 5, 2024, 8:04:05" + kNNBSP + "PM", FormatDate("2024-01-05T15:04:05-05:00"));
-  // Crossing midnight changes the day.
-  EXPECT_EQ("Jan 6, 2024, 1:30:00" + kNNBSP + "AM", FormatDate("2024-01-05T23:30:00-02:00"));
-}
-
-TEST(FormatDate, LocalZoneAppliesToTheUTCInstant) {
-  PinnedLocaleAndZone pin("en_US", "America/New_York");
-  EXPECT_EQ("Jan 5, 2024, 10:04:05" + kNNBSP + "AM", FormatDate("2024-01-05T15:04:05Z"));
-  // Summer time.
-  EXPECT_EQ("Jul 1, 2024, 8:00:00" + kNNBSP + "AM", FormatDate("2024-07-01T12:00:00+00:00"));
-  EXPECT_EQ("Jul 1, 2024, 4:00:00" + kNNBSP + "AM", FormatDate("2024-07-01T12:00:00+04:00"));
-}
-
-TEST(FormatDate, ZeroOffsetCountsAsUTCWhateverItsSign) {
-  PinnedLocaleAndZone pin("en_US", "UTC");
-  EXPECT_EQ("Jan 5, 2024, 3:04:05" + kNNBSP + "PM", FormatDate("2024-01-05T15:04:05-00:00"));
-  EXPECT_EQ("Jan 5, 2024, 3:04:05" + kNNBSP + "PM", FormatDate("2024-01-05T15:04:05+00:00"));
-}
-
-TEST(FormatDate, DateTimeWithoutZoneCountsAsUTC) {
-  PinnedLocaleAndZone pin("en_US", "Asia/Tokyo");
-  EXPECT_EQ("Jan 6, 2024, 12:04:05" + kNNBSP + "AM", FormatDate("2024-01-05T15:04:05"));
-}
-
-TEST(FormatDate, DateAloneUsesTheDateStyleAndKeepsTheDay) {
-  PinnedLocaleAndZone pin("en_US", "America/Los_Angeles");
-  EXPECT_EQ("Jan 5, 2024", FormatDate("2024-01-05"));
-  EXPECT_EQ("Dec 31, 1999", FormatDate("1999-12-31"));
-}
-
-TEST(FormatDate, TimeAloneUsesTheTimeStyle) {
-  PinnedLocaleAndZone pin("en_US", "UTC");
-  EXPECT_EQ("3:04:05" + kNNBSP + "PM", FormatDate("T15:04:05Z"));
-}
-
-TEST(FormatDate, FollowsTheApplicationLanguage) {
-  PinnedLocaleAndZone pin("de_DE", "Europe/Berlin");
-  EXPECT_EQ("05.01.2024, 16:04:05", FormatDate("2024-01-05T15:04:05Z"));
-  EXPECT_EQ("05.01.2024", FormatDate("2024-01-05"));
+TEST(FormatDate, ShownInTheApplicationLanguageAndLocalZone) {
+  const std::string pm = kNNBSP + "PM";
+  const std::string am = kNNBSP + "AM";
+  const struct {
+    const char* language;
+    const char* zone;
+    const char* value;
+    std::string expected;
+  } cases[] = {
+      {"en_US", "UTC", "2024-01-05T15:04:05Z", "Jan 5, 2024, 3:04:05" + pm},
+      // An offset is moved to UTC first, possibly across midnight.
+      {"en_US", "UTC", "2024-01-05T15:04:05-05:00", "Jan 5, 2024, 8:04:05" + pm},
+      {"en_US", "UTC", "2024-01-05T23:30:00-02:00", "Jan 6, 2024, 1:30:00" + am},
+      // A zero offset counts as UTC whatever its sign.
+      {"en_US", "UTC", "2024-01-05T15:04:05-00:00", "Jan 5, 2024, 3:04:05" + pm},
+      {"en_US", "UTC", "2024-01-05T15:04:05+00:00", "Jan 5, 2024, 3:04:05" + pm},
+      // The local zone applies to the UTC instant, with summer time.
+      {"en_US", "America/New_York", "2024-01-05T15:04:05Z", "Jan 5, 2024, 10:04:05" + am},
+      {"en_US", "America/New_York", "2024-07-01T12:00:00+00:00", "Jul 1, 2024, 8:00:00" + am},
+      {"en_US", "America/New_York", "2024-07-01T12:00:00+04:00", "Jul 1, 2024, 4:00:00" + am},
+      // A date-time without zone counts as UTC.
+      {"en_US", "Asia/Tokyo", "2024-01-05T15:04:05", "Jan 6, 2024, 12:04:05" + am},
+      // A date alone uses the date style and keeps its day; a time alone the time style.
+      {"en_US", "America/Los_Angeles", "2024-01-05", "Jan 5, 2024"},
+      {"en_US", "America/Los_Angeles", "1999-12-31", "Dec 31, 1999"},
+      {"en_US", "UTC", "T15:04:05Z", "3:04:05" + pm},
+      {"de_DE", "Europe/Berlin", "2024-01-05T15:04:05Z", "05.01.2024, 16:04:05"},
+      {"de_DE", "Europe/Berlin", "2024-01-05", "05.01.2024"},
+  };
+  for (const auto& c : cases) {
+    PinnedLocaleAndZone pin(c.language, c.zone);
+    EXPECT_EQ(FormatDate(c.value), c.expected) << c.language << " " << c.zone << " " << c.value;
+  }
 }
 
 TEST(FormatDate, RefusesUnreadableOrInvalidValues) {
   PinnedLocaleAndZone pin("en_US", "UTC");
-  EXPECT_EQ("", FormatDate(""));
-  EXPECT_EQ("", FormatDate("yesterday"));
-  EXPECT_EQ("", FormatDate("2024-13-01"));
-  EXPECT_EQ("", FormatDate("2024-01-32"));
-  EXPECT_EQ("", FormatDate("2024-01-05T24:00:00Z"));
-  EXPECT_EQ("", FormatDate("2024-01-05T12:60:00Z"));
-  EXPECT_EQ("", FormatDate("2024-01-05T12:00:60Z"));
   // A year or a month alone names no day.
-  EXPECT_EQ("", FormatDate("2024"));
-  EXPECT_EQ("", FormatDate("2024-01"));
+  for (const char* value : {"", "yesterday", "2024-13-01", "2024-01-32", "2024-01-05T24:00:00Z",
+                            "2024-01-05T12:60:00Z", "2024-01-05T12:00:60Z", "2024", "2024-01"})
+    EXPECT_EQ(FormatDate(value), "") << value;
 }
 
 }  // namespace
