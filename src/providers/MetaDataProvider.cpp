@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <utility>
 
+#include <ovracore/Localizer.h>
 #include <ovraxmp/XMPDocOps.h>
 #include <ovraxmp/XMPToolkit.h>
 #include <ovrametadata/Initialize.h>
@@ -37,6 +38,22 @@ UTF8String ChangePartForPath(const Path& path) {
     part += path.description;
   }
   return part;
+}
+
+// Reporting must not throw either: the guard's destructor calls it.
+void ReportWriteBackFailure(const MetaDataProvider& provider, const std::vector<Path>& paths) noexcept {
+  try {
+    const std::string where = paths.empty() ? std::string()
+                                            : paths.front().namespaceURI + paths.front().description;
+    const auto* file = dynamic_cast<const FileProvider*>(&provider);
+    SendError(kErrorWritingXMP,
+              ovracore::ZString("$$$/ovrametadata/ErrorInXMPData/InvalidData=invalid data in "
+                                "#{quot}@0#{quot}.",
+                                {where}),
+              file ? file->FilePath() : UTF16String());
+  } catch (...) {
+    // Out of memory while reporting: the write-back is abandoned all the same.
+  }
 }
 
 }  // namespace
@@ -231,9 +248,15 @@ MetaDataUpdateAccess::MetaDataUpdateAccess(const boost::shared_ptr<MetaDataProvi
     : MetaDataReadAccess(provider), mProvider(provider) {}
 
 MetaDataUpdateAccess::~MetaDataUpdateAccess() {
-  // An exception escaping the write-back ends the process (destructors are
-  // noexcept); the concrete providers swallow their own failures.
-  if (mProvider) mProvider->DoWriteChanges(mChanges);
+  // An exception escaping the write-back would end the process (destructors
+  // are noexcept): a toolkit failure while recording the history or
+  // distributing the changes is reported instead, and nothing is written.
+  if (!mProvider) return;
+  try {
+    mProvider->DoWriteChanges(mChanges);
+  } catch (...) {
+    ReportWriteBackFailure(*mProvider, mChanges);
+  }
 }
 
 void MetaDataUpdateAccess::AddChange(const Path& path) { mChanges.push_back(path); }

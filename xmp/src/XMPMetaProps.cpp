@@ -75,6 +75,66 @@ void RequireArray(XmpPtr xmp, const std::string& ns, const std::string& arrayNam
   if (form) *form = options;
 }
 
+// Aliases the toolkit registers whose actual property is an array. The
+// toolkit resolves a bare alias to one item (the "x-default" text, the
+// first creator), so the kind checks of array and language-alternative
+// operations, and paths that step below the alias, would see the item and
+// refuse; those are taken to the actual array instead.
+struct ArrayAlias {
+  const char* ns;
+  const char* name;
+  const char* actualNS;
+  const char* actualName;
+};
+
+const char kNS_PDF[] = "http://ns.adobe.com/pdf/1.3/";
+const char kNS_PNG[] = "http://ns.adobe.com/png/1.0/";
+
+const ArrayAlias kArrayAliases[] = {
+    {kXMP_NS_XMP, "Authors", kXMP_NS_DC, "creator"},
+    {kXMP_NS_XMP, "Description", kXMP_NS_DC, "description"},
+    {kXMP_NS_XMP, "Keywords", kXMP_NS_DC, "subject"},
+    {kXMP_NS_XMP, "Locale", kXMP_NS_DC, "language"},
+    {kXMP_NS_XMP, "Title", kXMP_NS_DC, "title"},
+    {kXMP_NS_XMP_Rights, "Copyright", kXMP_NS_DC, "rights"},
+    {kNS_PDF, "Subject", kXMP_NS_DC, "description"},
+    {kNS_PDF, "Title", kXMP_NS_DC, "title"},
+    {kXMP_NS_Photoshop, "Caption", kXMP_NS_DC, "description"},
+    {kXMP_NS_Photoshop, "Copyright", kXMP_NS_DC, "rights"},
+    {kXMP_NS_Photoshop, "Keywords", kXMP_NS_DC, "subject"},
+    {kXMP_NS_Photoshop, "Title", kXMP_NS_DC, "title"},
+    {kXMP_NS_TIFF, "Copyright", kXMP_NS_DC, "rights"},
+    {kXMP_NS_TIFF, "ImageDescription", kXMP_NS_DC, "description"},
+    {kNS_PNG, "Copyright", kXMP_NS_DC, "rights"},
+    {kNS_PNG, "Description", kXMP_NS_DC, "description"},
+    {kNS_PNG, "Title", kXMP_NS_DC, "title"},
+};
+
+// True (with the actual namespace and path) when path starts with an array
+// alias; with belowOnly, only when the path steps below it.
+bool ResolveArrayAlias(const std::string& ns, const std::string& path, bool belowOnly, std::string* actualNS,
+                       std::string* actualPath) {
+  const std::size_t stop = path.find_first_of("/[");
+  if (belowOnly && stop == std::string::npos) return false;
+  const ArrayAlias* candidate = nullptr;
+  for (const ArrayAlias& alias : kArrayAliases) {
+    if (ns == alias.ns) {
+      candidate = &alias;
+      break;
+    }
+  }
+  if (!candidate) return false;
+  const std::string first = detail::NormalizedPath(ns, path.substr(0, stop));
+  for (const ArrayAlias* alias = candidate; alias != std::end(kArrayAliases) && ns == alias->ns; ++alias) {
+    if (first == alias->name) {
+      *actualNS = alias->actualNS;
+      *actualPath = alias->actualName + (stop == std::string::npos ? std::string() : path.substr(stop));
+      return true;
+    }
+  }
+  return false;
+}
+
 // The implied form bits: alt-text is an alternative is ordered is an array.
 XMP_OptionBits WithImpliedBits(XMP_OptionBits options) {
   if (options & kXMP_PropArrayIsAltText) options |= kXMP_PropArrayIsAlternate;
@@ -209,8 +269,12 @@ void XMPMeta::Erase() {
 
 // ---- simple properties ----
 
-bool XMPMeta::GetProperty(const std::string& ns, const std::string& name, std::string* value,
+bool XMPMeta::GetProperty(const std::string& nsIn, const std::string& nameIn, std::string* value,
                           XMP_OptionBits* options) const {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, nameIn, true, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& name = aliased ? aliasPath : nameIn;
   XMPPacket& packet = detail::Require(mRef);
   XmpPtr xmp = packet.Xmp();
   if (!detail::NamespaceKnown(packet, ns)) return false;
@@ -228,8 +292,12 @@ bool XMPMeta::GetProperty(const std::string& ns, const std::string& name, std::s
   return true;
 }
 
-void XMPMeta::SetProperty(const std::string& ns, const std::string& name, const std::string& value,
+void XMPMeta::SetProperty(const std::string& nsIn, const std::string& nameIn, const std::string& value,
                           XMP_OptionBits options) {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, nameIn, true, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& name = aliased ? aliasPath : nameIn;
   XmpPtr xmp = X(mRef);
   detail::RequirePrefix(ns);
   options = WithImpliedBits(options);
@@ -243,7 +311,11 @@ void XMPMeta::SetProperty(const std::string& ns, const std::string& name, const 
   if (!xmp_set_property(xmp, ns.c_str(), name.c_str(), value.c_str(), options)) Fail("writing", ns, name);
 }
 
-void XMPMeta::DeleteProperty(const std::string& ns, const std::string& name) {
+void XMPMeta::DeleteProperty(const std::string& nsIn, const std::string& nameIn) {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, nameIn, true, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& name = aliased ? aliasPath : nameIn;
   XmpPtr xmp = X(mRef);
   if (!detail::NamespaceKnown(ns)) return;
   char missing = 0;
@@ -252,7 +324,11 @@ void XMPMeta::DeleteProperty(const std::string& ns, const std::string& name) {
   if (!xmp_delete_property(xmp, ns.c_str(), name.c_str())) Fail("deleting", ns, name);
 }
 
-bool XMPMeta::DoesPropertyExist(const std::string& ns, const std::string& name) const {
+bool XMPMeta::DoesPropertyExist(const std::string& nsIn, const std::string& nameIn) const {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, nameIn, true, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& name = aliased ? aliasPath : nameIn;
   XmpPtr xmp = X(mRef);
   if (!detail::NamespaceKnown(ns)) return false;
   char missing = 0;
@@ -348,8 +424,12 @@ void XMPMeta::SetProperty_Date(const std::string& ns, const std::string& name, c
 
 // ---- arrays ----
 
-bool XMPMeta::GetArrayItem(const std::string& ns, const std::string& arrayName, XMP_Index index,
+bool XMPMeta::GetArrayItem(const std::string& nsIn, const std::string& arrayNameIn, XMP_Index index,
                            std::string* value, XMP_OptionBits* options) const {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
   XmpPtr xmp = X(mRef);
   CheckIndex(index);
   bool exists = false;
@@ -366,8 +446,12 @@ bool XMPMeta::GetArrayItem(const std::string& ns, const std::string& arrayName, 
   return true;
 }
 
-void XMPMeta::SetArrayItem(const std::string& ns, const std::string& arrayName, XMP_Index index,
+void XMPMeta::SetArrayItem(const std::string& nsIn, const std::string& arrayNameIn, XMP_Index index,
                            const std::string& value, XMP_OptionBits options) {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
   XmpPtr xmp = X(mRef);
   detail::RequirePrefix(ns);
   CheckIndex(index);
@@ -393,8 +477,12 @@ void XMPMeta::SetArrayItem(const std::string& ns, const std::string& arrayName, 
   }
 }
 
-void XMPMeta::AppendArrayItem(const std::string& ns, const std::string& arrayName, XMP_OptionBits arrayOptions,
+void XMPMeta::AppendArrayItem(const std::string& nsIn, const std::string& arrayNameIn, XMP_OptionBits arrayOptions,
                               const std::string& value, XMP_OptionBits options) {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
   XmpPtr xmp = X(mRef);
   detail::RequirePrefix(ns);
   arrayOptions = WithImpliedBits(arrayOptions);
@@ -419,7 +507,11 @@ void XMPMeta::AppendArrayItem(const std::string& ns, const std::string& arrayNam
     Fail("appending to", ns, arrayName);
 }
 
-void XMPMeta::DeleteArrayItem(const std::string& ns, const std::string& arrayName, XMP_Index index) {
+void XMPMeta::DeleteArrayItem(const std::string& nsIn, const std::string& arrayNameIn, XMP_Index index) {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
   std::string path;
   XMPUtils::ComposeArrayItemPath(ns, arrayName, index, &path);
   bool exists = false;
@@ -427,7 +519,11 @@ void XMPMeta::DeleteArrayItem(const std::string& ns, const std::string& arrayNam
   if (exists) DeleteProperty(ns, path);
 }
 
-bool XMPMeta::DoesArrayItemExist(const std::string& ns, const std::string& arrayName, XMP_Index index) const {
+bool XMPMeta::DoesArrayItemExist(const std::string& nsIn, const std::string& arrayNameIn, XMP_Index index) const {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
   std::string path;
   XMPUtils::ComposeArrayItemPath(ns, arrayName, index, &path);
   bool exists = false;
@@ -435,7 +531,11 @@ bool XMPMeta::DoesArrayItemExist(const std::string& ns, const std::string& array
   return exists && DoesPropertyExist(ns, path);
 }
 
-XMP_Index XMPMeta::CountArrayItems(const std::string& ns, const std::string& arrayName) const {
+XMP_Index XMPMeta::CountArrayItems(const std::string& nsIn, const std::string& arrayNameIn) const {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
   XmpPtr xmp = X(mRef);
   bool exists = false;
   RequireArray(xmp, ns, arrayName, &exists);
@@ -530,9 +630,13 @@ bool XMPMeta::DoesQualifierExist(const std::string& ns, const std::string& propN
 
 // ---- localised text ----
 
-bool XMPMeta::GetLocalizedText(const std::string& ns, const std::string& altTextName,
+bool XMPMeta::GetLocalizedText(const std::string& nsIn, const std::string& altTextNameIn,
                                const std::string& genericLang, const std::string& specificLang,
                                std::string* actualLang, std::string* itemValue, XMP_OptionBits* options) const {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, altTextNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& altTextName = aliased ? aliasPath : altTextNameIn;
   XmpPtr xmp = X(mRef);
   if (specificLang.empty()) detail::Throw(kXMPErr_BadParam, "empty specific language");
   XMP_OptionBits form = 0;
@@ -552,9 +656,13 @@ bool XMPMeta::GetLocalizedText(const std::string& ns, const std::string& altText
   return true;
 }
 
-void XMPMeta::SetLocalizedText(const std::string& ns, const std::string& altTextName,
+void XMPMeta::SetLocalizedText(const std::string& nsIn, const std::string& altTextNameIn,
                                const std::string& genericLang, const std::string& specificLang,
                                const std::string& itemValue, XMP_OptionBits options) {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, altTextNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& altTextName = aliased ? aliasPath : altTextNameIn;
   XmpPtr xmp = X(mRef);
   detail::RequirePrefix(ns);
   if (specificLang.empty()) detail::Throw(kXMPErr_BadParam, "empty specific language");
@@ -566,8 +674,12 @@ void XMPMeta::SetLocalizedText(const std::string& ns, const std::string& altText
     Fail("writing localised", ns, altTextName);
 }
 
-void XMPMeta::DeleteLocalizedText(const std::string& ns, const std::string& altTextName,
+void XMPMeta::DeleteLocalizedText(const std::string& nsIn, const std::string& altTextNameIn,
                                   const std::string& genericLang, const std::string& specificLang) {
+  std::string aliasNS, aliasPath;
+  const bool aliased = ResolveArrayAlias(nsIn, altTextNameIn, false, &aliasNS, &aliasPath);
+  const std::string& ns = aliased ? aliasNS : nsIn;
+  const std::string& altTextName = aliased ? aliasPath : altTextNameIn;
   XmpPtr xmp = X(mRef);
   XMP_OptionBits form = 0;
   if (!NodeOptions(xmp, ns, altTextName, &form) || !(form & kXMP_PropArrayIsAlternate)) return;

@@ -1,0 +1,79 @@
+// Properties that the toolkit keeps under another name (tiff:ImageDescription
+// is dc:description, tiff:Artist the first dc:creator, ...): reads and
+// writes through the alias reach the actual property, quietly.
+#include <string>
+
+#include <gtest/gtest.h>
+
+#include "XMPTestUtil.h"
+
+using namespace ovraxmp;
+
+namespace {
+
+const char kPhotoshop[] = "http://ns.adobe.com/photoshop/1.0/";
+
+XMPMeta Described() {
+  return xmptest::Parse(
+      "<x:xmpmeta xmlns:x=\"adobe:ns:meta/\"><rdf:RDF xmlns:rdf=\"http://www.w3.org/1999/02/22-rdf-syntax-ns#\">"
+      "<rdf:Description rdf:about=\"\" xmlns:dc=\"http://purl.org/dc/elements/1.1/\">"
+      "<dc:description><rdf:Alt><rdf:li xml:lang=\"x-default\">A harbour at dusk</rdf:li>"
+      "</rdf:Alt></dc:description>"
+      "<dc:rights><rdf:Alt><rdf:li xml:lang=\"x-default\">(c) Ana</rdf:li></rdf:Alt></dc:rights>"
+      "<dc:creator><rdf:Seq><rdf:li>Ana</rdf:li><rdf:li>Ben</rdf:li></rdf:Seq></dc:creator>"
+      "<dc:subject><rdf:Bag><rdf:li>sea</rdf:li><rdf:li>boat</rdf:li><rdf:li>dusk</rdf:li></rdf:Bag></dc:subject>"
+      "</rdf:Description></rdf:RDF></x:xmpmeta>");
+}
+
+TEST(XMPAliases, ReadsThroughAnAliasReachTheActualProperty) {
+  const XMPMeta meta = Described();
+  testing::internal::CaptureStderr();
+  std::string lang, text, simple, item, fieldless;
+  const bool description = meta.GetLocalizedText(kXMP_NS_TIFF, "ImageDescription", "", "x-default", &lang, &text);
+  const bool prefixed = meta.GetLocalizedText(kXMP_NS_TIFF, "tiff:ImageDescription", "", "x-default", nullptr, &item);
+  const XMP_Index keywords = meta.CountArrayItems(kPhotoshop, "Keywords");
+  std::string rights;
+  const bool copyright = meta.GetLocalizedText(kXMP_NS_TIFF, "Copyright", "", "x-default", nullptr, &rights);
+  std::string artist;
+  const bool hasArtist = meta.GetProperty(kXMP_NS_TIFF, "Artist", &artist);
+  std::string second;
+  const bool hasSecond = meta.GetArrayItem(kPhotoshop, "Keywords", 2, &second);
+  std::string first;
+  const bool hasFirst = meta.GetProperty(kXMP_NS_TIFF, "ImageDescription[1]", &first);
+  const bool exists = meta.DoesArrayItemExist(kXMP_NS_TIFF, "Copyright", 1);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+
+  EXPECT_TRUE(description);
+  EXPECT_EQ(text, "A harbour at dusk");
+  EXPECT_EQ(lang, "x-default");
+  EXPECT_TRUE(prefixed);
+  EXPECT_EQ(item, "A harbour at dusk");
+  EXPECT_EQ(keywords, 3);
+  EXPECT_TRUE(copyright);
+  EXPECT_EQ(rights, "(c) Ana");
+  EXPECT_TRUE(hasArtist);
+  EXPECT_EQ(artist, "Ana");
+  EXPECT_TRUE(hasSecond);
+  EXPECT_EQ(second, "boat");
+  EXPECT_TRUE(hasFirst);
+  EXPECT_EQ(first, "A harbour at dusk");
+  EXPECT_TRUE(exists);
+}
+
+TEST(XMPAliases, WritesThroughAnAliasChangeTheActualProperty) {
+  XMPMeta meta = Described();
+  meta.SetLocalizedText(kXMP_NS_TIFF, "ImageDescription", "", "x-default", "Boats");
+  meta.AppendArrayItem(kPhotoshop, "Keywords", kXMP_PropValueIsArray, "net");
+  meta.DeleteLocalizedText(kXMP_NS_TIFF, "Copyright", "", "x-default");
+  std::string text;
+  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "description", "", "x-default", nullptr, &text));
+  EXPECT_EQ(text, "Boats");
+  EXPECT_EQ(meta.CountArrayItems(kXMP_NS_DC, "subject"), 4);
+  EXPECT_FALSE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "x-default", nullptr, &text));
+  // Without the actual property, the alias reads as absent.
+  const XMPMeta empty;
+  EXPECT_FALSE(empty.GetLocalizedText(kXMP_NS_TIFF, "ImageDescription", "", "x-default", nullptr, &text));
+  EXPECT_EQ(empty.CountArrayItems(kPhotoshop, "Keywords"), 0);
+}
+
+}  // namespace
