@@ -264,7 +264,7 @@ const Expected kRealWorld[] = {
     {kAggregate, "ShutterSpeed", "text", "", "text", true},
 };
 
-TEST(BuiltinDefinitions, RealWorldPropertiesHaveTheirPublishedTypes) {
+TEST(BuiltinDefinitions, RealWorldPropertiesAndTheirPathsHaveTheirPublishedTypes) {
   ovratest::LibraryScope library;
   for (const auto& row : kRealWorld) {
     SCOPED_TRACE(std::string(row.namespaceURI) + row.name);
@@ -293,6 +293,13 @@ TEST(BuiltinDefinitions, RealWorldPropertiesHaveTheirPublishedTypes) {
     const TypeDefinitionPtr valueType = PropertyTypeOf(*property);
     ASSERT_TRUE(valueType);
     EXPECT_EQ(valueType->name, *row.elementType ? row.elementType : row.type);
+
+    // The property's path resolves to the same definition and kind.
+    const Path path = PathForSchemaNameAndPropertyName(row.namespaceURI, row.name);
+    EXPECT_EQ(path.internal, row.internal);
+    EXPECT_EQ(path.description, row.name);
+    EXPECT_EQ(PathEntryDefinition(path), boost::shared_ptr<EntryDefinition>(property));
+    EXPECT_EQ(PrimitiveTypeOfPath(path), kind);
   }
 }
 
