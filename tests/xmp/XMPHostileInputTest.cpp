@@ -186,6 +186,26 @@ TEST(XMPHostileInput, HostileFilesOpenWithoutXMPAndStayUntouched) {
   }
 }
 
+TEST(XMPHostileInput, StoredPacketsTheToolkitCannotParseMeanNoXMP) {
+  // Well-formed XML that is not valid XMP: the handler would hand over an
+  // empty or partial packet, and a write would replace what it dropped.
+  ovratest::TempDir dir;
+  const std::string packets[] = {
+      hostile::Packet("<rdf:li>misplaced</rdf:li>"),
+      hostile::Packet("<dc:format>kept</dc:format><dc:title><rdf:Bag><rdf:Alt/></rdf:Bag></dc:title>"),
+  };
+  int n = 0;
+  for (const std::string& packet : packets) {
+    const std::string path = (dir / ("bad" + std::to_string(++n) + ".jpg")).string();
+    ovratest::WriteFile(path, JpegWith(hostile::Wrapped(packet)));
+    testing::internal::CaptureStderr();  // the toolkit names what it dropped
+    XMPFiles file(path, kXMP_UnknownFile, kRead);
+    XMPMeta meta;
+    EXPECT_FALSE(file.GetXMP(&meta)) << packet;
+    testing::internal::GetCapturedStderr();
+  }
+}
+
 TEST(XMPHostileInput, WellFormedFilesOfTheSameShapesAreRead) {
   ovratest::TempDir dir;
   const std::string packet = hostile::Packet("<dc:format>image/x-test</dc:format>");
