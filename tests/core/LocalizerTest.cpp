@@ -20,19 +20,18 @@ class Localizer : public ::testing::Test {
 };
 }  // namespace
 
-TEST_F(Localizer, KeyFallsBackToTextAfterFirstEquals) {
-  EXPECT_EQ(ZStringUTF8("$$$/ovrametadata/x/Unknown=unknown error."), "unknown error.");
-  EXPECT_EQ(ZStringUTF8("$$$/a/b=x=y"), "x=y");
-  EXPECT_EQ(ZStringUTF8("$$$/a/NoDefault"), "$$$/a/NoDefault");
-  EXPECT_EQ(ZString("$$$/a/b=\xC3\xA9t\xC3\xA9"), u"\u00E9t\u00E9");
-}
-
-TEST_F(Localizer, TextWithoutKeyComesBackUnchanged) {
-  EXPECT_EQ(ZStringUTF8("Plain = text $$$/not/a/key=x"), "Plain = text $$$/not/a/key=x");
-  EXPECT_EQ(ZStringUTF8(""), "");
+TEST_F(Localizer, KeyFallsBackToTextAfterFirstEqualsAndPlainTextStaysUnchanged) {
   // Even when a dictionary knows the same words as a key.
   AddDictionaryEntry("Plain", "Other");
-  EXPECT_EQ(ZStringUTF8("Plain"), "Plain");
+  const std::pair<const char*, const char*> cases[] = {
+      {"$$$/ovrametadata/x/Unknown=unknown error.", "unknown error."},
+      {"$$$/a/b=x=y", "x=y"},
+      {"$$$/a/NoDefault", "$$$/a/NoDefault"},
+      {"Plain = text $$$/not/a/key=x", "Plain = text $$$/not/a/key=x"},
+      {"", ""},
+      {"Plain", "Plain"}};
+  for (const auto& [text, shown] : cases) EXPECT_EQ(ZStringUTF8(text), shown) << text;
+  EXPECT_EQ(ZString("$$$/a/b=\xC3\xA9t\xC3\xA9"), u"\u00E9t\u00E9");
 }
 
 TEST_F(Localizer, DictionaryFilesLaterEntriesWinAndCommentsAreIgnored) {

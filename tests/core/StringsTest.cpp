@@ -1,6 +1,8 @@
 #include <clocale>
 #include <limits>
 #include <locale>
+#include <optional>
+#include <utility>
 
 #include <gtest/gtest.h>
 
@@ -17,23 +19,22 @@ TEST(Conversions, ValidTextRoundTripsThroughUTF16) {
 
 TEST(Conversions, InvalidUTF8BecomesReplacementWithoutEatingValidText) {
   // Stray continuation, truncated sequence, overlong "/", encoded surrogate,
-  // value above U+10FFFF, impossible lead byte.
-  EXPECT_EQ(ToUTF16("a\x80z"), u"a\uFFFDz");
-  EXPECT_EQ(ToUTF16("a\xE2\x82z"), u"a\uFFFDz");
-  EXPECT_EQ(ToUTF16("\xE2\x82"), u"\uFFFD");
-  EXPECT_EQ(ToUTF16("\xC0\xAF"), u"\uFFFD\uFFFD");
-  EXPECT_EQ(ToUTF16("\xED\xA0\x80"), u"\uFFFD");
-  EXPECT_EQ(ToUTF16("\xF4\x90\x80\x80"), u"\uFFFD");
-  EXPECT_EQ(ToUTF16("\xFF"), u"\uFFFD");
-  EXPECT_EQ(ToUTF16(std::string("a\0b", 3)), UTF16String(u"a\0b", 3));
+  // value above U+10FFFF, impossible lead byte, embedded NUL.
+  const std::pair<std::string, UTF16String> cases[] = {
+      {"a\x80z", u"a\uFFFDz"},    {"a\xE2\x82z", u"a\uFFFDz"},   {"\xE2\x82", u"\uFFFD"},
+      {"\xC0\xAF", u"\uFFFD\uFFFD"}, {"\xED\xA0\x80", u"\uFFFD"}, {"\xF4\x90\x80\x80", u"\uFFFD"},
+      {"\xFF", u"\uFFFD"},        {std::string("a\0b", 3), UTF16String(u"a\0b", 3)}};
+  for (const auto& [in, out] : cases) EXPECT_EQ(ToUTF16(in), out) << in;
 }
 
 TEST(Conversions, LoneSurrogatesBecomeReplacementAndPairsSurvive) {
-  EXPECT_EQ(ToUTF8(UTF16String{0xD800}), "\xEF\xBF\xBD");
-  EXPECT_EQ(ToUTF8(UTF16String{u'x', 0xDC00, u'y'}), "x\xEF\xBF\xBDy");
-  EXPECT_EQ(ToUTF8(UTF16String{0xDBFF, 0xDFFF}), "\xF4\x8F\xBF\xBF");  // U+10FFFF
-  // High surrogate followed by a non-surrogate keeps the second character.
-  EXPECT_EQ(ToUTF8(UTF16String{0xD83C, u'A'}), "\xEF\xBF\xBD" "A");
+  const std::pair<UTF16String, std::string> cases[] = {
+      {{0xD800}, "\xEF\xBF\xBD"},
+      {{u'x', 0xDC00, u'y'}, "x\xEF\xBF\xBDy"},
+      {{0xDBFF, 0xDFFF}, "\xF4\x8F\xBF\xBF"},  // U+10FFFF
+      // High surrogate followed by a non-surrogate keeps the second character.
+      {{0xD83C, u'A'}, "\xEF\xBF\xBD" "A"}};
+  for (const auto& [in, out] : cases) EXPECT_EQ(ToUTF8(in), out);
   std::string out;
   AppendCodePoint(out, 0x110000);
   AppendCodePoint(out, 0xDFFF);
@@ -41,57 +42,37 @@ TEST(Conversions, LoneSurrogatesBecomeReplacementAndPairsSurvive) {
 }
 
 TEST(Coercion, StrictFormsAcceptWholeNumbersOnly) {
-  EXPECT_EQ(ToDouble(" 1.5 "), 1.5);
-  EXPECT_EQ(ToDouble("+2"), 2.0);
-  EXPECT_EQ(ToDouble("-1e3"), -1000.0);
-  EXPECT_FALSE(ToDouble(""));
-  EXPECT_FALSE(ToDouble("1.5x"));
-  EXPECT_FALSE(ToDouble("1,5"));
-  EXPECT_FALSE(ToDouble("nan"));
-  EXPECT_FALSE(ToDouble("1e999"));
-  EXPECT_FALSE(ToDouble("+-1"));
-
+  const std::pair<const char*, std::optional<double>> doubles[] = {
+      {" 1.5 ", 1.5}, {"+2", 2.0}, {"-1e3", -1000.0}, {"", {}}, {"1.5x", {}}, {"1,5", {}}, {"nan", {}},
+      {"1e999", {}},  {"+-1", {}}};
+  for (const auto& [text, value] : doubles) EXPECT_TRUE(ToDouble(text) == value) << text;
   EXPECT_EQ(ToInt64("-9223372036854775808"), INT64_MIN);
   EXPECT_FALSE(ToInt64("9223372036854775808"));
   EXPECT_EQ(ToInt32("\t+42\n"), 42);
-  EXPECT_FALSE(ToInt32("2147483648"));
-  EXPECT_FALSE(ToInt32("1.0"));
-  EXPECT_FALSE(ToInt32("0x10"));
+  for (const char* text : {"2147483648", "1.0", "0x10"}) EXPECT_FALSE(ToInt32(text)) << text;
   EXPECT_EQ(ToUInt8("255"), 255);
   EXPECT_FALSE(ToUInt8("256"));
   EXPECT_FALSE(ToUInt8("-1"));
 }
 
 TEST(Coercion, LenientFormTakesLongestPrefix) {
-  EXPECT_EQ(CoerceToDouble("5.6 mm"), 5.6);
-  EXPECT_EQ(CoerceToDouble("  -3/4"), -3.0);
-  EXPECT_EQ(CoerceToDouble("f/2.8"), 0.0);
-  EXPECT_EQ(CoerceToDouble(""), 0.0);
-  EXPECT_EQ(CoerceToDouble("inf"), 0.0);
+  const std::pair<const char*, double> cases[] = {{"5.6 mm", 5.6}, {"  -3/4", -3.0}, {"f/2.8", 0.0}, {"", 0.0},
+                                                  {"inf", 0.0}};
+  for (const auto& [text, value] : cases) EXPECT_EQ(CoerceToDouble(text), value) << text;
 }
 
-TEST(NumberFormatting, FixedDecimalsRoundHalfAwayFromZero) {
-  EXPECT_EQ(NumberToString(2.5, 2), "2.50");
-  EXPECT_EQ(NumberToString(2.675, 2), "2.68");
-  EXPECT_EQ(NumberToString(0.125, 2), "0.13");
-  EXPECT_EQ(NumberToString(-0.125, 2), "-0.13");
-  EXPECT_EQ(NumberToString(2.5, 0), "3");
-  EXPECT_EQ(NumberToString(-2.5, 0), "-3");
-  EXPECT_EQ(NumberToString(9.995, 2), "10.00");
-  EXPECT_EQ(NumberToString(999.96, 1), "1000.0");
-  EXPECT_EQ(NumberToString(0.0005, 3), "0.001");
-  EXPECT_EQ(NumberToString(0.0004, 2), "0.00");
-  EXPECT_EQ(NumberToString(1.0 / 3.0, 4), "0.3333");
-  EXPECT_EQ(NumberToString(1e20, 1), "100000000000000000000.0");
-  EXPECT_EQ(NumberToString(123456789.0, 0), "123456789");
-}
-
-TEST(NumberFormatting, SignsAndSpecialValues) {
-  EXPECT_EQ(NumberToString(-0.0, 1), "0.0");
-  EXPECT_EQ(NumberToString(-0.001, 2), "0.00");
-  EXPECT_EQ(NumberToString(0.0, 0), "0");
-  EXPECT_EQ(NumberToString(std::numeric_limits<double>::quiet_NaN(), 2), "nan");
-  EXPECT_EQ(NumberToString(-std::numeric_limits<double>::infinity(), 2), "-inf");
+TEST(NumberFormatting, FixedDecimalsRoundHalfAwayFromZeroWhateverTheSign) {
+  const struct {
+    double value;
+    int decimals;
+    const char* text;
+  } cases[] = {{2.5, 2, "2.50"},      {2.675, 2, "2.68"},     {0.125, 2, "0.13"},      {-0.125, 2, "-0.13"},
+               {2.5, 0, "3"},         {-2.5, 0, "-3"},        {9.995, 2, "10.00"},     {999.96, 1, "1000.0"},
+               {0.0005, 3, "0.001"},  {0.0004, 2, "0.00"},    {1.0 / 3.0, 4, "0.3333"}, {123456789.0, 0, "123456789"},
+               {1e20, 1, "100000000000000000000.0"},           {-0.0, 1, "0.0"},        {-0.001, 2, "0.00"},
+               {0.0, 0, "0"},         {std::numeric_limits<double>::quiet_NaN(), 2, "nan"},
+               {-std::numeric_limits<double>::infinity(), 2, "-inf"}};
+  for (const auto& c : cases) EXPECT_EQ(NumberToString(c.value, c.decimals), c.text) << c.value;
   EXPECT_EQ(NumberToUTF16String(5.6, 1), u"5.6");
 }
 
@@ -121,12 +102,15 @@ TEST(NumberFormatting, IgnoresProcessLocale) {
 }
 
 TEST(Tokenizing, KeepsOrDropsEmptyTokens) {
-  EXPECT_EQ(Tokenize("1/250", "/"), (std::vector<UTF8String>{"1", "250"}));
-  EXPECT_EQ(Tokenize("a//b/", "/"), (std::vector<UTF8String>{"a", "", "b", ""}));
-  EXPECT_EQ(Tokenize("a, b;;c", ",; ", false), (std::vector<UTF8String>{"a", "b", "c"}));
-  EXPECT_EQ(Tokenize("", "/"), (std::vector<UTF8String>{""}));
-  EXPECT_TRUE(Tokenize("//", "/", false).empty());
-  EXPECT_EQ(Tokenize("abc", ""), (std::vector<UTF8String>{"abc"}));
+  const struct {
+    const char* text;
+    const char* separators;
+    bool keepEmpty;
+    std::vector<UTF8String> tokens;
+  } cases[] = {{"1/250", "/", true, {"1", "250"}}, {"a//b/", "/", true, {"a", "", "b", ""}},
+               {"a, b;;c", ",; ", false, {"a", "b", "c"}}, {"", "/", true, {""}}, {"//", "/", false, {}},
+               {"abc", "", true, {"abc"}}};
+  for (const auto& c : cases) EXPECT_EQ(Tokenize(c.text, c.separators, c.keepEmpty), c.tokens) << c.text;
 }
 
 TEST(XMLReserved, EncodeDecodeRoundTrip) {
