@@ -2,6 +2,7 @@
 // points.
 #include "DefinitionsParser.h"
 
+#include <forward_list>
 #include <string_view>
 
 #include <boost/make_shared.hpp>
@@ -23,28 +24,38 @@ const char* const kInvalidXML = "$$$/ovrametadata/DefinitionsParser/InvalidXML=i
 
 // The attributes this format knows, taken in one pass over the element's
 // attributes (start-up parses every built-in file, so lookups one by one
-// would dominate). An absent attribute reads as the empty string.
+// would dominate). The views point into the parser's attributes, valid for
+// the current element only; an absent attribute reads as empty.
 struct DefinitionAttributes {
-  UTF8String namespaceURI, prefix, label, description, dynamic, name, type, extends, elementType,
-      pattern, max, min, deprecated, category, rawValue, multiLine;
+  std::string_view namespaceURI, prefix, label, description, dynamic, name, type, extends,
+      elementType, pattern, max, min, deprecated, category, rawValue, multiLine;
   bool hasDeprecated = false;
+  // Values that needed decoding live here; a list, so that none moves.
+  std::forward_list<UTF8String> decoded;
 };
 
 // Every value passes through the reserved-character decoding as well.
+std::string_view Decoded(DefinitionAttributes& read, std::string_view value) {
+  if (value.find('&') == std::string_view::npos) return value;
+  read.decoded.push_front(ovracore::DecodeXMLReserved(value));
+  return read.decoded.front();
+}
+
 UTF8String Decoded(std::string_view value) {
   return value.find('&') == std::string_view::npos ? UTF8String(value)
                                                    : ovracore::DecodeXMLReserved(value);
 }
 
-DefinitionAttributes ReadAttributes(const ovracore::Attributes& attributes) {
-  DefinitionAttributes read;
+void ReadAttributes(const ovracore::Attributes& attributes, DefinitionAttributes& read) {
   for (const auto& [key, value] : attributes.All()) {
     const std::string_view name = key.second;
     if (!key.first.empty()) {
-      if (key.first == kDefinitionsUINamespace && name == "multiLine"sv) read.multiLine = Decoded(value);
+      if (name == "multiLine"sv && key.first == kDefinitionsUINamespace) {
+        read.multiLine = Decoded(read, value);
+      }
       continue;
     }
-    UTF8String* target = nullptr;
+    std::string_view* target = nullptr;
     if (name == "namespace"sv) target = &read.namespaceURI;
     else if (name == "prefix"sv) target = &read.prefix;
     else if (name == "label"sv) target = &read.label;
@@ -63,15 +74,15 @@ DefinitionAttributes ReadAttributes(const ovracore::Attributes& attributes) {
     }
     else if (name == "category"sv) target = &read.category;
     else if (name == "raw_value"sv) target = &read.rawValue;
-    if (target) *target = Decoded(value);
+    if (target) *target = Decoded(read, value);
   }
-  return read;
 }
 
 // Texts without a key, placeholder or escape come out of the localiser
 // unchanged, so they skip it.
-UTF16String Localized(UTF8String const& text, UTF16String const& asWritten) {
-  if (text.compare(0, 4, "$$$/") != 0 && text.find_first_of("#@") == UTF8String::npos) {
+UTF16String Localized(std::string_view text, UTF16String const& asWritten) {
+  if (text.compare(0, 4, "$$$/"sv) != 0 && text.find('#') == std::string_view::npos &&
+      text.find('@') == std::string_view::npos) {
     return asWritten;
   }
   return ovracore::ZString(text);
@@ -87,10 +98,10 @@ void ReadLabelAndDescription(LocalizedDefinition& definition, DefinitionAttribut
 // The attributes shared by properties, fields, qualifiers and types, in
 // the order the format defines.
 void ReadEntryAttributes(EntryDefinition& entry, DefinitionAttributes const& read) {
-  if (!read.type.empty()) entry.type = read.type;
+  if (!read.type.empty()) entry.type = UTF8String(read.type);
   if (!read.name.empty()) entry.name = read.name;
   if (!read.extends.empty()) {
-    entry.extends = PrimitiveTypeIdAsPrimitiveType(read.extends);
+    entry.extends = PrimitiveTypeIdAsPrimitiveType(UTF8String(read.extends));
     if (!entry.extends) {
       // Reported without a source: the entry's file is not known here.
       SendError(kDefinitionParsingError,
@@ -99,8 +110,8 @@ void ReadEntryAttributes(EntryDefinition& entry, DefinitionAttributes const& rea
                 UTF16String());
     }
   }
-  if (!read.elementType.empty()) entry.constraints.elementType = read.elementType;
-  if (!read.pattern.empty()) entry.constraints.pattern = read.pattern;
+  if (!read.elementType.empty()) entry.constraints.elementType = UTF8String(read.elementType);
+  if (!read.pattern.empty()) entry.constraints.pattern = UTF8String(read.pattern);
   // A bound that is not a number is left out.
   if (!read.max.empty()) {
     if (const auto value = ovracore::ToDouble(read.max)) entry.constraints.max = *value;
@@ -108,7 +119,7 @@ void ReadEntryAttributes(EntryDefinition& entry, DefinitionAttributes const& rea
   if (!read.min.empty()) {
     if (const auto value = ovracore::ToDouble(read.min)) entry.constraints.min = *value;
   }
-  if (read.hasDeprecated) entry.constraints.deprecated = read.deprecated == "true";
+  if (read.hasDeprecated) entry.constraints.deprecated = read.deprecated == "true"sv;
   ReadLabelAndDescription(entry, read);
 }
 
@@ -158,19 +169,21 @@ void DefinitionsParser::StartElementNoNamespace(const UTF8String& name,
 }
 
 void DefinitionsParser::StartSchema(const ovracore::Attributes& attributes) {
-  const DefinitionAttributes read = ReadAttributes(attributes);
+  DefinitionAttributes read;
+  ReadAttributes(attributes, read);
   auto schema = boost::make_shared<SchemaDefinition>();
   schema->namespaceURI = read.namespaceURI;
   schema->prefix = read.prefix;
   ReadLabelAndDescription(*schema, read);
-  schema->isDynamic = read.dynamic == "true";
+  schema->isDynamic = read.dynamic == "true"sv;
   if (schema->label.empty()) schema->label = ovracore::ToUTF16(schema->prefix);
   currentProperties = &schema->properties;
   mResult.first.push_back(schema);
 }
 
 void DefinitionsParser::StartType(const ovracore::Attributes& attributes) {
-  const DefinitionAttributes read = ReadAttributes(attributes);
+  DefinitionAttributes read;
+  ReadAttributes(attributes, read);
   auto type = boost::make_shared<TypeDefinition>();
   ReadEntryAttributes(*type, read);
   ApplyLabelRule(*type, read);
@@ -181,7 +194,8 @@ void DefinitionsParser::StartType(const ovracore::Attributes& attributes) {
 }
 
 void DefinitionsParser::StartField(const ovracore::Attributes& attributes) {
-  const DefinitionAttributes read = ReadAttributes(attributes);
+  DefinitionAttributes read;
+  ReadAttributes(attributes, read);
   if (!currentFields) {
     Report(ovracore::ZString(
         "$$$/ovrametadata/DefinitionsParser/InvalidFieldTag=invalid field tag #{quot}@0#{quot}.",
@@ -204,7 +218,8 @@ void DefinitionsParser::StartChoice(const ovracore::Attributes& attributes) {
         "$$$/ovrametadata/DefinitionsParser/InvalidChoiceTag=invalid choice tag."));
     return;
   }
-  const DefinitionAttributes read = ReadAttributes(attributes);
+  DefinitionAttributes read;
+  ReadAttributes(attributes, read);
   auto choice = boost::make_shared<ChoiceDefinition>();
   choice->rawValue = read.rawValue;
   choice->labelSource = ovracore::ToUTF16(read.label);
@@ -219,7 +234,8 @@ void DefinitionsParser::StartQualifier(const ovracore::Attributes& attributes) {
         "$$$/ovrametadata/DefinitionsParser/InvalidQualifierTag=invalid qualifier tag."));
     return;
   }
-  const DefinitionAttributes read = ReadAttributes(attributes);
+  DefinitionAttributes read;
+  ReadAttributes(attributes, read);
   auto qualifier = boost::make_shared<QualifierDefinition>();
   qualifier->namespaceURI = read.namespaceURI;
   qualifier->prefix = read.prefix;
@@ -231,16 +247,17 @@ void DefinitionsParser::StartQualifier(const ovracore::Attributes& attributes) {
 }
 
 void DefinitionsParser::StartProperty(const ovracore::Attributes& attributes) {
-  const DefinitionAttributes read = ReadAttributes(attributes);
+  DefinitionAttributes read;
+  ReadAttributes(attributes, read);
   if (!currentProperties) {
-    ReportInvalidProperty(read.name);
+    ReportInvalidProperty(UTF8String(read.name));
     return;
   }
   auto property = boost::make_shared<PropertyDefinition>();
-  property->isInternal = read.category == "internal";
+  property->isInternal = read.category == "internal"sv;
   ReadEntryAttributes(*property, read);
   ApplyLabelRule(*property, read);
-  if (read.multiLine == "true") property->uiHints = PropertyUIHints{false, true};
+  if (read.multiLine == "true"sv) property->uiHints = PropertyUIHints{false, true};
   currentProperties->push_back(property);
   currentChoices = &property->constraints.choices;
   currentQualifiers = &property->constraints.qualifiers;

@@ -2,6 +2,7 @@
 
 #include <charconv>
 #include <cstdlib>
+#include <deque>
 #include <mutex>
 #include <shared_mutex>
 #include <unordered_map>
@@ -16,9 +17,22 @@ constexpr std::string_view kKeyPrefix = "$$$/";
 // Dictionaries are small text files; anything bigger is not one.
 constexpr std::size_t kMaxDictionaryBytes = 64u * 1024u * 1024u;
 
+// Keys are looked up as views of the caller's text, so a lookup costs no
+// copy; the keys themselves live in a deque, whose elements never move.
 struct Dictionary {
   std::shared_mutex mutex;
-  std::unordered_map<std::string, std::string> entries;
+  std::deque<std::string> keys;
+  std::unordered_map<std::string_view, std::string> entries;
+
+  void Set(std::string_view key, std::string_view text) {
+    const auto it = entries.find(key);
+    if (it != entries.end()) {
+      it->second.assign(text);
+      return;
+    }
+    keys.emplace_back(key);
+    entries.emplace(keys.back(), std::string(text));
+  }
 };
 
 Dictionary& sDictionary() {
@@ -92,10 +106,19 @@ UTF8String Expand(std::string_view text, std::initializer_list<std::string_view>
   return out;
 }
 
-}  // namespace
-
-UTF8String ZStringUTF8(std::string_view text, std::initializer_list<std::string_view> args) {
-  if (text.compare(0, kKeyPrefix.size(), kKeyPrefix) != 0) return Expand(text, args);
+// Calls convert with the text to show for text: the text itself, its
+// default text or the dictionary's entry for its key, each expanded.
+// Texts without escapes or placeholders are handed over without a copy.
+template <class Convert>
+auto Localize(std::string_view text, std::initializer_list<std::string_view> args, Convert convert) {
+  const auto expanded = [&](std::string_view chosen) {
+    // Two scans for one character each: find_first_of tests the set per character.
+    if (chosen.find('@') == std::string_view::npos && chosen.find('#') == std::string_view::npos) {
+      return convert(chosen);
+    }
+    return convert(std::string_view(Expand(chosen, args)));
+  };
+  if (text.compare(0, kKeyPrefix.size(), kKeyPrefix) != 0) return expanded(text);
   const std::size_t equals = text.find('=');
   const std::string_view key = text.substr(0, equals);
   // A key without "=" has no default; the key itself is the least bad text.
@@ -103,14 +126,22 @@ UTF8String ZStringUTF8(std::string_view text, std::initializer_list<std::string_
   Dictionary& dictionary = sDictionary();
   {
     std::shared_lock<std::shared_mutex> lock(dictionary.mutex);
-    const auto it = dictionary.entries.find(std::string(key));
-    if (it != dictionary.entries.end()) return Expand(it->second, args);
+    if (!dictionary.entries.empty()) {
+      const auto it = dictionary.entries.find(key);
+      if (it != dictionary.entries.end()) return expanded(it->second);
+    }
   }
-  return Expand(fallback, args);
+  return expanded(fallback);
+}
+
+}  // namespace
+
+UTF8String ZStringUTF8(std::string_view text, std::initializer_list<std::string_view> args) {
+  return Localize(text, args, [](std::string_view shown) { return UTF8String(shown); });
 }
 
 UTF16String ZString(std::string_view text, std::initializer_list<std::string_view> args) {
-  return ToUTF16(ZStringUTF8(text, args));
+  return Localize(text, args, [](std::string_view shown) { return ToUTF16(shown); });
 }
 
 bool AddDictionaryFile(const UTF16String& path) {
@@ -135,20 +166,21 @@ bool AddDictionaryFile(const UTF16String& path) {
 
   Dictionary& dictionary = sDictionary();
   std::unique_lock<std::shared_mutex> lock(dictionary.mutex);
-  for (const auto& [key, text] : parsed) dictionary.entries[std::string(key)] = std::string(text);
+  for (const auto& [key, text] : parsed) dictionary.Set(key, text);
   return true;
 }
 
 void AddDictionaryEntry(std::string_view key, std::string_view text) {
   Dictionary& dictionary = sDictionary();
   std::unique_lock<std::shared_mutex> lock(dictionary.mutex);
-  dictionary.entries[std::string(key)] = std::string(text);
+  dictionary.Set(key, text);
 }
 
 void ClearDictionaries() {
   Dictionary& dictionary = sDictionary();
   std::unique_lock<std::shared_mutex> lock(dictionary.mutex);
   dictionary.entries.clear();
+  dictionary.keys.clear();
 }
 
 UTF8String ApplicationLanguage() {

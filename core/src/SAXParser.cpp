@@ -15,23 +15,48 @@ namespace ovracore {
 
 // ---------------------------------------------------------------- Attributes
 
+namespace {
+
+bool KeyLess(const Attributes::Key& a, const Attributes::Key& b) {
+  const int byNamespace = a.first.compare(b.first);
+  return byNamespace != 0 ? byNamespace < 0 : a.second < b.second;
+}
+
+}  // namespace
+
 void Attributes::Add(UTF8String namespaceURI, UTF8String localName, UTF8String value) {
-  mValues[Key(std::move(namespaceURI), std::move(localName))] = std::move(value);
+  Key key(std::move(namespaceURI), std::move(localName));
+  const auto it = std::lower_bound(mValues.begin(), mValues.end(), key,
+                                   [](const Entry& e, const Key& k) { return KeyLess(e.first, k); });
+  if (it != mValues.end() && it->first == key) {
+    it->second = std::move(value);
+  } else {
+    mValues.emplace(it, std::move(key), std::move(value));
+  }
+}
+
+const Attributes::Entry* Attributes::Lookup(std::string_view localName,
+                                            std::string_view namespaceURI) const {
+  for (const Entry& entry : mValues) {
+    if (entry.first.second == localName && entry.first.first == namespaceURI) return &entry;
+  }
+  return nullptr;
 }
 
 std::optional<UTF8String> Attributes::Find(std::string_view localName,
                                            std::string_view namespaceURI) const {
-  const auto it = mValues.find(Key(UTF8String(namespaceURI), UTF8String(localName)));
-  if (it == mValues.end()) return std::nullopt;
-  return it->second;
+  const Entry* entry = Lookup(localName, namespaceURI);
+  if (!entry) return std::nullopt;
+  return entry->second;
 }
 
 UTF8String Attributes::Get(std::string_view localName, std::string_view namespaceURI) const {
-  return Find(localName, namespaceURI).value_or(UTF8String());
+  const Entry* entry = Lookup(localName, namespaceURI);
+  return entry ? entry->second : UTF8String();
 }
 
 bool Attributes::Has(std::string_view localName, std::string_view namespaceURI) const {
-  return mValues.count(Key(UTF8String(namespaceURI), UTF8String(localName))) != 0;
+  return Lookup(localName, namespaceURI) != nullptr;
 }
 
 // ------------------------------------------------------ AbstractParseHandler
@@ -81,6 +106,64 @@ void SplitName(const XML_Char* name, UTF8String& namespaceURI, UTF8String& local
   }
 }
 
+}  // namespace
+
+// Refills one Attributes object element after element, so that the strings
+// of earlier elements lend their storage to the next ones.
+class AttributesFiller {
+ public:
+  // An attribute as expat hands it out, split but not yet copied.
+  struct Raw {
+    std::string_view namespaceURI;
+    std::string_view localName;
+    const XML_Char* value;
+  };
+
+  // scratch only saves allocations from call to call.
+  static void Fill(Attributes& target, const XML_Char** atts, std::vector<Raw>& scratch) {
+    scratch.clear();
+    for (const XML_Char** a = atts; a && *a; a += 2) {
+      const std::string_view full(a[0]);
+      const std::size_t sep = full.find(kNamespaceSeparator);
+      Raw raw{{}, full, a[1] ? a[1] : ""};
+      if (sep != std::string_view::npos) {
+        raw.namespaceURI = full.substr(0, sep);
+        raw.localName = full.substr(sep + 1);
+      }
+      // Few attributes, often nearly in order: an insertion sort, stable so
+      // that of two equal names the later one wins below.
+      std::size_t at = scratch.size();
+      scratch.push_back(raw);
+      while (at > 0 && Less(raw, scratch[at - 1])) {
+        scratch[at] = scratch[at - 1];
+        --at;
+      }
+      scratch[at] = raw;
+    }
+    std::vector<Attributes::Entry>& values = target.mValues;
+    std::size_t count = 0;
+    for (std::size_t i = 0; i < scratch.size(); ++i) {
+      // expat refuses repeated attributes; should one get through, it
+      // replaces the earlier one as Add does.
+      if (i + 1 < scratch.size() && !Less(scratch[i], scratch[i + 1])) continue;
+      if (count == values.size()) values.emplace_back();
+      Attributes::Entry& entry = values[count++];
+      entry.first.first.assign(scratch[i].namespaceURI);
+      entry.first.second.assign(scratch[i].localName);
+      entry.second.assign(scratch[i].value);
+    }
+    values.resize(count);
+  }
+
+ private:
+  static bool Less(const Raw& a, const Raw& b) {
+    const int byNamespace = a.namespaceURI.compare(b.namespaceURI);
+    return byNamespace != 0 ? byNamespace < 0 : a.localName < b.localName;
+  }
+};
+
+namespace {
+
 class ExpatParser final : public Parser {
  public:
   ExpatParser(AbstractParseHandler& handler, const ParserLimits& limits)
@@ -104,34 +187,40 @@ class ExpatParser final : public Parser {
   bool ParseBuffer(const char* data, std::size_t length) override {
     if (!Begin()) return false;
     if (length > mLimits.maxBytes) return Fail("document larger than " + std::to_string(mLimits.maxBytes) + " bytes");
-    // expat takes int lengths; feed big buffers in pieces.
+    // expat takes int lengths; feed big buffers in pieces. The last piece
+    // goes in as final: after a piece that is not, expat walks the whole
+    // piece again to keep its line count (error messages count lines anyway).
     std::size_t offset = 0;
-    do {
+    while (true) {
       const std::size_t piece = std::min<std::size_t>(length - offset, 1u << 30);
-      if (!Feed(data + offset, piece, false)) return false;
+      const bool last = offset + piece == length;
+      if (!Feed(data + offset, piece, last)) return false;
+      if (last) return true;
       offset += piece;
-    } while (offset < length);
-    return Feed(nullptr, 0, true);
+    }
   }
 
   bool ParseFile(const UTF16String& path) override {
     if (!Begin()) return false;
     std::ifstream in(filesupport::ToFSPath(path), std::ios::binary);
     if (!in) return Fail("cannot open " + ToUTF8(path));
-    std::vector<char> buffer(kReadChunk);
     std::size_t total = 0;
     while (true) {
-      in.read(buffer.data(), static_cast<std::streamsize>(buffer.size()));
+      // Read straight into expat's buffer: no copy, no buffer of our own.
+      void* buffer = XML_GetBuffer(mParser.get(), static_cast<int>(kReadChunk));
+      if (!buffer) return Fail("cannot read " + ToUTF8(path) + ": out of memory");
+      in.read(static_cast<char*>(buffer), static_cast<std::streamsize>(kReadChunk));
       const auto got = static_cast<std::size_t>(in.gcount());
       if (in.bad()) return Fail("cannot read " + ToUTF8(path));
       total += got;
       if (total > mLimits.maxBytes)
         return Fail("document larger than " + std::to_string(mLimits.maxBytes) + " bytes");
-      if (got == 0) break;
-      if (!Feed(buffer.data(), got, false)) return false;
-      if (!in) break;
+      // A short read is the end of the file: that chunk is the final one
+      // (see ParseBuffer).
+      const bool last = !in;
+      if (!FeedBuffer(got, last)) return false;
+      if (last) return true;
     }
-    return Feed(nullptr, 0, true);
   }
 
   UTF8String ErrorMessage() const override { return mError; }
@@ -151,7 +240,15 @@ class ExpatParser final : public Parser {
 
   // Passes bytes to expat; false when the parse has failed (by expat or by us).
   bool Feed(const char* data, std::size_t length, bool isFinal) {
-    const XML_Status status = XML_Parse(mParser.get(), data, static_cast<int>(length), isFinal);
+    return Parsed(XML_Parse(mParser.get(), data, static_cast<int>(length), isFinal), isFinal);
+  }
+
+  // The same for bytes already placed in the buffer of XML_GetBuffer.
+  bool FeedBuffer(std::size_t length, bool isFinal) {
+    return Parsed(XML_ParseBuffer(mParser.get(), static_cast<int>(length), isFinal), isFinal);
+  }
+
+  bool Parsed(XML_Status status, bool isFinal) {
     if (status == XML_STATUS_OK && mError.empty()) {
       if (isFinal) Guarded([this] { FlushCharacters(); });
       return mError.empty();
@@ -192,9 +289,9 @@ class ExpatParser final : public Parser {
 
   void FlushCharacters() {
     if (mText.empty() || mStopped) return;
-    UTF8String text;
-    text.swap(mText);
-    mHandler.Characters(text);
+    // Cleared after the call, so that the buffer's storage serves the next text.
+    mHandler.Characters(mText);
+    mText.clear();
   }
 
   static ExpatParser& Self(void* data) { return *static_cast<ExpatParser*>(data); }
@@ -219,15 +316,9 @@ class ExpatParser final : public Parser {
       ++self.mDepth;
       self.mChildCounts.push_back(0);
 
-      UTF8String ns;
-      UTF8String local;
-      Attributes attributes;
-      for (const XML_Char** a = atts; a && *a; a += 2) {
-        SplitName(a[0], ns, local);
-        attributes.Add(ns, local, a[1] ? a[1] : "");
-      }
-      SplitName(name, ns, local);
-      self.mHandler.StartElement(ns, local, attributes);
+      AttributesFiller::Fill(self.mAttributes, atts, self.mRawAttributes);
+      SplitName(name, self.mNamespaceURI, self.mLocalName);
+      self.mHandler.StartElement(self.mNamespaceURI, self.mLocalName, self.mAttributes);
     });
   }
 
@@ -237,10 +328,8 @@ class ExpatParser final : public Parser {
       self.FlushCharacters();
       if (self.mDepth > 0) --self.mDepth;
       if (!self.mChildCounts.empty()) self.mChildCounts.pop_back();
-      UTF8String ns;
-      UTF8String local;
-      SplitName(name, ns, local);
-      self.mHandler.EndElement(ns, local);
+      SplitName(name, self.mNamespaceURI, self.mLocalName);
+      self.mHandler.EndElement(self.mNamespaceURI, self.mLocalName);
     });
   }
 
@@ -280,6 +369,11 @@ class ExpatParser final : public Parser {
   ParserHandle mParser;
   UTF8String mError;
   UTF8String mText;
+  // Reused from element to element (see AttributesFiller).
+  Attributes mAttributes;
+  std::vector<AttributesFiller::Raw> mRawAttributes;
+  UTF8String mNamespaceURI;
+  UTF8String mLocalName;
   std::vector<std::size_t> mChildCounts;
   std::size_t mDepth = 0;
   bool mUsed = false;

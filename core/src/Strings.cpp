@@ -59,16 +59,6 @@ char32_t DecodeUTF8(std::string_view text, std::size_t& pos) {
   return cp;
 }
 
-void AppendUTF16(UTF16String& out, char32_t cp) {
-  if (cp < 0x10000) {
-    out.push_back(static_cast<char16_t>(cp));
-  } else {
-    cp -= 0x10000;
-    out.push_back(static_cast<char16_t>(0xD800 + (cp >> 10)));
-    out.push_back(static_cast<char16_t>(0xDC00 + (cp & 0x3FF)));
-  }
-}
-
 std::string_view StripPlus(std::string_view text) {
   // from_chars refuses a leading '+', which people do write; a sign after it
   // ("+-1") stays refused.
@@ -120,10 +110,28 @@ Decimal ShortestDecimal(double value) {
 }  // namespace
 
 UTF16String ToUTF16(std::string_view utf8) {
-  UTF16String out;
-  out.reserve(utf8.size());
+  // Never more code units than bytes, so the result is written in place;
+  // ASCII, nearly all of the text, skips the decoder.
+  UTF16String out(utf8.size(), u'\0');
+  std::size_t length = 0;
   std::size_t pos = 0;
-  while (pos < utf8.size()) AppendUTF16(out, DecodeUTF8(utf8, pos));
+  while (pos < utf8.size()) {
+    const auto byte = static_cast<unsigned char>(utf8[pos]);
+    if (byte < 0x80) {
+      out[length++] = byte;
+      ++pos;
+      continue;
+    }
+    char32_t cp = DecodeUTF8(utf8, pos);
+    if (cp < 0x10000) {
+      out[length++] = static_cast<char16_t>(cp);
+    } else {
+      cp -= 0x10000;
+      out[length++] = static_cast<char16_t>(0xD800 + (cp >> 10));
+      out[length++] = static_cast<char16_t>(0xDC00 + (cp & 0x3FF));
+    }
+  }
+  out.resize(length);
   return out;
 }
 

@@ -208,3 +208,54 @@ TEST(SAXParser, ParsesFilesAndOnlyOneDocument) {
   EXPECT_FALSE(other->ParseFile(ToUTF16((dir / "absent.xml").string())));
   EXPECT_FALSE(other->ErrorMessage().empty());
 }
+
+TEST(SAXParser, AttributesKeepOneValuePerNameInNameOrder) {
+  Attributes attrs;
+  attrs.Add("", "type", "text");
+  attrs.Add("urn:ui", "multiLine", "true");
+  attrs.Add("", "name", "first");
+  attrs.Add("", "name", "second");  // replaces
+  std::vector<std::string> listed;
+  for (const auto& [key, value] : attrs.All()) listed.push_back("{" + key.first + "}" + key.second + "=" + value);
+  EXPECT_EQ(listed, (std::vector<std::string>{"{}name=second", "{}type=text", "{urn:ui}multiLine=true"}));
+  EXPECT_EQ(attrs.Get("name"), "second");
+  EXPECT_FALSE(attrs.Has("multiLine"));
+  EXPECT_EQ(attrs.Find("multiLine", "urn:ui"), std::optional<std::string>("true"));
+
+  // Elements one after the other: each sees only its own attributes.
+  Recorder r;
+  ASSERT_TRUE(Parse(r, "<r z=\"1\" a=\"2\" m=\"3\"><e only=\"x\"/><e/><e b=\"y\" a=\"z\"/></r>"));
+  EXPECT_EQ(r.events, (std::vector<std::string>{
+                          "start {}r {}a=2 {}m=3 {}z=1", "plain-start r 3",
+                          "start {}e {}only=x", "plain-start e 1", "end {}e", "plain-end e",
+                          "start {}e", "plain-start e 0", "end {}e", "plain-end e",
+                          "start {}e {}a=z {}b=y", "plain-start e 2", "end {}e", "plain-end e",
+                          "end {}r", "plain-end r",
+                      }));
+}
+
+TEST(SAXParser, FilesAroundTheReadChunkSizeParseWhole) {
+  ovratest::TempDir dir;
+  // The reader takes 64 KiB at a time: sizes just below, at and above it,
+  // and a few chunks.
+  for (const std::size_t size : {std::size_t{65535}, std::size_t{65536}, std::size_t{65537}, std::size_t{200000}}) {
+    const std::string text(size - 7, 'x');
+    ovratest::WriteFile(dir / "doc.xml", "<r>" + text + "</r>");
+    Recorder r;
+    const std::unique_ptr<Parser> parser = GetParserWithNamespaceSupport(r);
+    ASSERT_TRUE(parser->ParseFile(ToUTF16((dir / "doc.xml").string()))) << size << parser->ErrorMessage();
+    ASSERT_EQ(r.events.size(), 5u) << size;
+    EXPECT_EQ(r.events[2], "text " + text) << size;
+
+    // A fault in the last chunk still names its line.
+    ovratest::WriteFile(dir / "bad.xml", "<r>" + text + "\n\n</x>");
+    Recorder bad;
+    const std::unique_ptr<Parser> failing = GetParserWithNamespaceSupport(bad);
+    EXPECT_FALSE(failing->ParseFile(ToUTF16((dir / "bad.xml").string()))) << size;
+    EXPECT_EQ(failing->ErrorMessage().rfind("line 3,", 0), 0u) << failing->ErrorMessage();
+  }
+  Recorder r;
+  std::string error;
+  EXPECT_FALSE(Parse(r, "<r>\n<a/>\n</x>", &error));
+  EXPECT_EQ(error.rfind("line 3,", 0), 0u) << error;
+}

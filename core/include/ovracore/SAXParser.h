@@ -2,10 +2,10 @@
 #pragma once
 
 #include <cstddef>
-#include <map>
 #include <memory>
 #include <optional>
 #include <utility>
+#include <vector>
 
 #include <ovracore/Strings.h>
 
@@ -13,21 +13,29 @@ namespace ovracore {
 
 // Attributes of one element. Each keeps its namespace URI (empty for
 // unqualified attributes). Values are already decoded by the XML parser.
+// Elements carry a handful of attributes, so they sit in one small vector
+// kept in (namespace URI, local name) order rather than in a tree.
 class Attributes {
  public:
   using Key = std::pair<UTF8String, UTF8String>;  // (namespace URI, local name)
+  using Entry = std::pair<Key, UTF8String>;
 
+  // Adding an attribute that is already there replaces its value.
   void Add(UTF8String namespaceURI, UTF8String localName, UTF8String value);
   // The value of an attribute, or absent.
   std::optional<UTF8String> Find(std::string_view localName, std::string_view namespaceURI = {}) const;
   // The value of an attribute, or the empty string when it is absent.
   UTF8String Get(std::string_view localName, std::string_view namespaceURI = {}) const;
   bool Has(std::string_view localName, std::string_view namespaceURI = {}) const;
-  const std::map<Key, UTF8String>& All() const { return mValues; }
+  // Every attribute, ordered by namespace URI and then local name.
+  const std::vector<Entry>& All() const { return mValues; }
   bool Empty() const { return mValues.empty(); }
 
  private:
-  std::map<Key, UTF8String> mValues;
+  friend class AttributesFiller;
+  const Entry* Lookup(std::string_view localName, std::string_view namespaceURI) const;
+
+  std::vector<Entry> mValues;
 };
 
 // Handlers derive from this class and override what they need. Elements
