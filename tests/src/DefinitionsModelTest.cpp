@@ -12,12 +12,8 @@ TEST(PrimitiveTypes, TypeIdsRoundTripAndAreCaseSensitive) {
     EXPECT_EQ(PrimitiveTypeAsPrimitiveTypeId(type), ids[value]);
     EXPECT_EQ(PrimitiveTypeIdAsPrimitiveType(ids[value]), boost::make_optional(type));
   }
-  EXPECT_FALSE(PrimitiveTypeIdAsPrimitiveType("Text"));
-  EXPECT_FALSE(PrimitiveTypeIdAsPrimitiveType("date"));
-  EXPECT_FALSE(PrimitiveTypeIdAsPrimitiveType(""));
-  EXPECT_FALSE(PrimitiveTypeIdAsPrimitiveType("text "));
-  EXPECT_EQ(PrimitiveTypeAsPrimitiveTypeId(static_cast<PrimitiveType>(9)), "");
-  EXPECT_EQ(PrimitiveTypeAsPrimitiveTypeId(static_cast<PrimitiveType>(-1)), "");
+  for (const char* id : {"Text", "date", "", "text "}) EXPECT_FALSE(PrimitiveTypeIdAsPrimitiveType(id)) << id;
+  for (int value : {9, -1}) EXPECT_EQ(PrimitiveTypeAsPrimitiveTypeId(static_cast<PrimitiveType>(value)), "");
 }
 
 TEST(PrimitiveTypes, ClassPredicates) {
@@ -58,51 +54,61 @@ TEST(PrimitiveTypes, SimpleScalarElementsNeedNoRegistry) {
   }
 }
 
-TEST(DateValue, DefaultIsAllZerosAndOrderingIsFieldByField) {
-  const Date zero;
-  EXPECT_EQ(zero.year, 0);
-  EXPECT_EQ(zero.second, 0);
-  EXPECT_TRUE(zero == Date());
-  EXPECT_FALSE(zero < Date());
-
-  Date a{2024, 5, 17, 10, 30, 15};
-  Date b = a;
-  b.second = 16;
-  EXPECT_TRUE(a < b);
-  EXPECT_FALSE(b < a);
-  EXPECT_FALSE(a == b);
-
-  // The year decides before every later field.
-  Date earlierYear{2023, 12, 31, 23, 59, 59};
-  EXPECT_TRUE(earlierYear < a);
-  Date laterMonth{2024, 6, 1, 0, 0, 0};
-  EXPECT_TRUE(a < laterMonth);
+TEST(DateValue, OrderingIsFieldByFieldFromTheYear) {
+  EXPECT_TRUE(Date() == (Date{0, 0, 0, 0, 0, 0}));
+  EXPECT_FALSE(Date() < Date());
+  const Date a{2024, 5, 17, 10, 30, 15};
+  for (const Date& later : {Date{2024, 5, 17, 10, 30, 16}, Date{2024, 6, 1, 0, 0, 0}, Date{2025, 1, 1, 0, 0, 0}}) {
+    EXPECT_TRUE(a < later);
+    EXPECT_FALSE(later < a);
+    EXPECT_FALSE(a == later);
+  }
+  EXPECT_TRUE((Date{2023, 12, 31, 23, 59, 59}) < a);
   EXPECT_TRUE(a == (Date{2024, 5, 17, 10, 30, 15}));
 }
 
-TypeDefinition MakeType(boost::optional<std::string> type, boost::optional<PrimitiveType> extends,
-                        boost::optional<std::string> elementType = boost::none) {
-  TypeDefinition definition;
-  definition.type = type;
-  definition.extends = extends;
-  definition.constraints.elementType = elementType;
-  return definition;
-}
-
-TEST(TypeDefinitionQueries, KindComesFromThePrimitiveIdElseFromExtends) {
-  EXPECT_EQ(PrimitiveTypeOf(MakeType(std::string("bag"), kPrimitiveType_seq)),
-            boost::make_optional(kPrimitiveType_bag));
-  EXPECT_EQ(PrimitiveTypeOf(MakeType(std::string("myList"), kPrimitiveType_seq)),
-            boost::make_optional(kPrimitiveType_seq));
-  EXPECT_FALSE(PrimitiveTypeOf(MakeType(std::string("myStruct"), boost::none)));
-  EXPECT_FALSE(PrimitiveTypeOf(MakeType(boost::none, kPrimitiveType_seq)));
-
-  EXPECT_TRUE(IsArrayType(MakeType(std::string("myList"), kPrimitiveType_alt)));
-  EXPECT_FALSE(IsArrayType(MakeType(std::string("myChoice"), kPrimitiveType_closedchoice)));
+TEST(TypeDefinitionQueries, KindSimpleArrayAndElementTypeOfUnregisteredTypes) {
+  using Text = boost::optional<std::string>;
+  using Kind = boost::optional<PrimitiveType>;
+  const struct {
+    Text type;
+    Kind extends;
+    Text elementType;
+    Kind kind;  // from the primitive id, else from extends
+    bool simple, array;
+    Text elementTypeOf;  // only choices and arrays that extend their kind
+  } cases[] = {
+      {Text("bag"), kPrimitiveType_seq, {}, kPrimitiveType_bag, false, true, {}},
+      {Text("myList"), kPrimitiveType_seq, {}, kPrimitiveType_seq, false, true, {}},
+      {Text("myList"), kPrimitiveType_alt, {}, kPrimitiveType_alt, false, true, {}},
+      {Text("myStruct"), {}, {}, {}, false, false, {}},
+      {{}, kPrimitiveType_seq, {}, {}, false, false, {}},
+      {{}, kPrimitiveType_text, {}, {}, false, false, {}},
+      {Text("myChoice"), kPrimitiveType_closedchoice, {}, kPrimitiveType_closedchoice, false, false, {}},
+      {Text("real"), {}, {}, kPrimitiveType_real, true, false, {}},
+      {Text("rating"), kPrimitiveType_integer, {}, kPrimitiveType_integer, true, false, {}},
+      {Text("mode"), kPrimitiveType_closedchoice, Text("integer"), kPrimitiveType_closedchoice, true, false,
+       Text("integer")},
+      {Text("list"), kPrimitiveType_bag, Text("real"), kPrimitiveType_bag, false, true, Text("real")},
+      {Text("bag"), {}, Text("real"), kPrimitiveType_bag, false, true, {}},
+      {Text("rating"), kPrimitiveType_integer, Text("real"), kPrimitiveType_integer, true, false, {}},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.type.value_or("-"));
+    TypeDefinition definition;
+    definition.type = c.type;
+    definition.extends = c.extends;
+    definition.constraints.elementType = c.elementType;
+    EXPECT_EQ(PrimitiveTypeOf(definition), c.kind);
+    EXPECT_EQ(IsSimpleType(definition), c.simple);
+    EXPECT_EQ(IsArrayType(definition), c.array);
+    EXPECT_EQ(ElementTypeIdOf(definition), c.elementTypeOf);
+  }
 }
 
 TEST(TypeDefinitionQueries, StructIsDecidedByFieldsAlone) {
-  TypeDefinition type = MakeType(std::string("text"), boost::none);
+  TypeDefinition type;
+  type.type = std::string("text");
   EXPECT_FALSE(IsStructType(type));
   type.fields.push_back(boost::make_shared<FieldDefinition>());
   EXPECT_TRUE(IsStructType(type));
@@ -110,23 +116,6 @@ TEST(TypeDefinitionQueries, StructIsDecidedByFieldsAlone) {
   type.extends = kPrimitiveType_bag;
   type.constraints.elementType = std::string("text");
   EXPECT_FALSE(ElementTypeIdOf(type));
-}
-
-TEST(TypeDefinitionQueries, SimpleAndElementTypes) {
-  EXPECT_TRUE(IsSimpleType(MakeType(std::string("real"), boost::none)));
-  EXPECT_TRUE(IsSimpleType(MakeType(std::string("rating"), kPrimitiveType_integer)));
-  EXPECT_TRUE(IsSimpleType(
-      MakeType(std::string("mode"), kPrimitiveType_closedchoice, std::string("integer"))));
-  EXPECT_FALSE(IsSimpleType(MakeType(std::string("mode"), kPrimitiveType_closedchoice)));
-  EXPECT_FALSE(IsSimpleType(MakeType(std::string("list"), kPrimitiveType_bag, std::string("text"))));
-  EXPECT_FALSE(IsSimpleType(MakeType(boost::none, kPrimitiveType_text)));
-
-  EXPECT_EQ(ElementTypeIdOf(MakeType(std::string("list"), kPrimitiveType_bag, std::string("real"))),
-            boost::make_optional(std::string("real")));
-  // Element types count only for choices and arrays that extend their kind.
-  EXPECT_FALSE(ElementTypeIdOf(MakeType(std::string("bag"), boost::none, std::string("real"))));
-  EXPECT_FALSE(ElementTypeIdOf(
-      MakeType(std::string("rating"), kPrimitiveType_integer, std::string("real"))));
 }
 
 TEST(EntryDefinitionQueries, PrimitiveEntriesUseTheirOwnElementType) {
