@@ -47,10 +47,11 @@ UTF8String Decoded(std::string_view value) {
 }
 
 void ReadAttributes(const ovracore::Attributes& attributes, DefinitionAttributes& read) {
-  for (const auto& [key, value] : attributes.All()) {
-    const std::string_view name = key.second;
-    if (!key.first.empty()) {
-      if (name == "multiLine"sv && key.first == kDefinitionsUINamespace) {
+  for (const ovracore::Attributes::Entry& attribute : attributes.All()) {
+    const std::string_view name = attribute.localName;
+    const std::string_view value = attribute.value;
+    if (!attribute.namespaceURI.empty()) {
+      if (name == "multiLine"sv && attribute.namespaceURI == kDefinitionsUINamespace) {
         read.multiLine = Decoded(read, value);
       }
       continue;

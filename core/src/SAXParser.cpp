@@ -17,28 +17,48 @@ namespace ovracore {
 
 namespace {
 
-bool KeyLess(const Attributes::Key& a, const Attributes::Key& b) {
-  const int byNamespace = a.first.compare(b.first);
-  return byNamespace != 0 ? byNamespace < 0 : a.second < b.second;
+bool EntryLess(const Attributes::Entry& a, const Attributes::Entry& b) {
+  const int byNamespace = a.namespaceURI.compare(b.namespaceURI);
+  return byNamespace != 0 ? byNamespace < 0 : a.localName < b.localName;
 }
 
 }  // namespace
 
-void Attributes::Add(UTF8String namespaceURI, UTF8String localName, UTF8String value) {
-  Key key(std::move(namespaceURI), std::move(localName));
-  const auto it = std::lower_bound(mValues.begin(), mValues.end(), key,
-                                   [](const Entry& e, const Key& k) { return KeyLess(e.first, k); });
-  if (it != mValues.end() && it->first == key) {
-    it->second = std::move(value);
-  } else {
-    mValues.emplace(it, std::move(key), std::move(value));
+Attributes::Attributes(const Attributes& other) : mEntries(other.mEntries) {
+  for (Entry& entry : mEntries) {
+    entry.namespaceURI = Own(UTF8String(entry.namespaceURI));
+    entry.localName = Own(UTF8String(entry.localName));
+    entry.value = Own(UTF8String(entry.value));
   }
+}
+
+Attributes& Attributes::operator=(const Attributes& other) {
+  if (this != &other) *this = Attributes(other);
+  return *this;
+}
+
+std::string_view Attributes::Own(UTF8String text) {
+  mTexts.push_front(std::move(text));
+  return mTexts.front();
+}
+
+void Attributes::Add(UTF8String namespaceURI, UTF8String localName, UTF8String value) {
+  Entry entry{namespaceURI, localName, {}};
+  const auto it = std::lower_bound(mEntries.begin(), mEntries.end(), entry, &EntryLess);
+  if (it != mEntries.end() && !EntryLess(entry, *it)) {
+    it->value = Own(std::move(value));
+    return;
+  }
+  entry.namespaceURI = Own(std::move(namespaceURI));
+  entry.localName = Own(std::move(localName));
+  entry.value = Own(std::move(value));
+  mEntries.insert(it, entry);
 }
 
 const Attributes::Entry* Attributes::Lookup(std::string_view localName,
                                             std::string_view namespaceURI) const {
-  for (const Entry& entry : mValues) {
-    if (entry.first.second == localName && entry.first.first == namespaceURI) return &entry;
+  for (const Entry& entry : mEntries) {
+    if (entry.localName == localName && entry.namespaceURI == namespaceURI) return &entry;
   }
   return nullptr;
 }
@@ -47,12 +67,12 @@ std::optional<UTF8String> Attributes::Find(std::string_view localName,
                                            std::string_view namespaceURI) const {
   const Entry* entry = Lookup(localName, namespaceURI);
   if (!entry) return std::nullopt;
-  return entry->second;
+  return UTF8String(entry->value);
 }
 
 UTF8String Attributes::Get(std::string_view localName, std::string_view namespaceURI) const {
   const Entry* entry = Lookup(localName, namespaceURI);
-  return entry ? entry->second : UTF8String();
+  return entry ? UTF8String(entry->value) : UTF8String();
 }
 
 bool Attributes::Has(std::string_view localName, std::string_view namespaceURI) const {
@@ -108,57 +128,41 @@ void SplitName(const XML_Char* name, UTF8String& namespaceURI, UTF8String& local
 
 }  // namespace
 
-// Refills one Attributes object element after element, so that the strings
-// of earlier elements lend their storage to the next ones.
+// Fills one Attributes object element after element with views of the
+// names and values expat hands out: nothing is copied.
 class AttributesFiller {
  public:
-  // An attribute as expat hands it out, split but not yet copied.
-  struct Raw {
-    std::string_view namespaceURI;
-    std::string_view localName;
-    const XML_Char* value;
-  };
-
-  // scratch only saves allocations from call to call.
-  static void Fill(Attributes& target, const XML_Char** atts, std::vector<Raw>& scratch) {
-    scratch.clear();
+  static void Fill(Attributes& target, const XML_Char** atts) {
+    std::vector<Attributes::Entry>& entries = target.mEntries;
+    entries.clear();
+    target.mTexts.clear();
     for (const XML_Char** a = atts; a && *a; a += 2) {
       const std::string_view full(a[0]);
       const std::size_t sep = full.find(kNamespaceSeparator);
-      Raw raw{{}, full, a[1] ? a[1] : ""};
+      Attributes::Entry entry{{}, full, a[1] ? a[1] : ""};
       if (sep != std::string_view::npos) {
-        raw.namespaceURI = full.substr(0, sep);
-        raw.localName = full.substr(sep + 1);
+        entry.namespaceURI = full.substr(0, sep);
+        entry.localName = full.substr(sep + 1);
       }
-      // Few attributes, often nearly in order: an insertion sort, stable so
-      // that of two equal names the later one wins below.
-      std::size_t at = scratch.size();
-      scratch.push_back(raw);
-      while (at > 0 && Less(raw, scratch[at - 1])) {
-        scratch[at] = scratch[at - 1];
+      // Few attributes: an insertion sort, stable so that of two equal
+      // names the later one stays below.
+      std::size_t at = entries.size();
+      entries.push_back(entry);
+      while (at > 0 && EntryLess(entry, entries[at - 1])) {
+        entries[at] = entries[at - 1];
         --at;
       }
-      scratch[at] = raw;
+      entries[at] = entry;
     }
-    std::vector<Attributes::Entry>& values = target.mValues;
-    std::size_t count = 0;
-    for (std::size_t i = 0; i < scratch.size(); ++i) {
-      // expat refuses repeated attributes; should one get through, it
-      // replaces the earlier one as Add does.
-      if (i + 1 < scratch.size() && !Less(scratch[i], scratch[i + 1])) continue;
-      if (count == values.size()) values.emplace_back();
-      Attributes::Entry& entry = values[count++];
-      entry.first.first.assign(scratch[i].namespaceURI);
-      entry.first.second.assign(scratch[i].localName);
-      entry.second.assign(scratch[i].value);
+    // expat refuses repeated attributes; should one get through, it
+    // replaces the earlier one as Add does.
+    for (std::size_t i = 1; i < entries.size();) {
+      if (!EntryLess(entries[i - 1], entries[i])) {
+        entries.erase(entries.begin() + static_cast<std::ptrdiff_t>(i) - 1);
+      } else {
+        ++i;
+      }
     }
-    values.resize(count);
-  }
-
- private:
-  static bool Less(const Raw& a, const Raw& b) {
-    const int byNamespace = a.namespaceURI.compare(b.namespaceURI);
-    return byNamespace != 0 ? byNamespace < 0 : a.localName < b.localName;
   }
 };
 
@@ -316,7 +320,7 @@ class ExpatParser final : public Parser {
       ++self.mDepth;
       self.mChildCounts.push_back(0);
 
-      AttributesFiller::Fill(self.mAttributes, atts, self.mRawAttributes);
+      AttributesFiller::Fill(self.mAttributes, atts);
       SplitName(name, self.mNamespaceURI, self.mLocalName);
       self.mHandler.StartElement(self.mNamespaceURI, self.mLocalName, self.mAttributes);
     });
@@ -369,9 +373,8 @@ class ExpatParser final : public Parser {
   ParserHandle mParser;
   UTF8String mError;
   UTF8String mText;
-  // Reused from element to element (see AttributesFiller).
+  // Reused from element to element, to keep their storage.
   Attributes mAttributes;
-  std::vector<AttributesFiller::Raw> mRawAttributes;
   UTF8String mNamespaceURI;
   UTF8String mLocalName;
   std::vector<std::size_t> mChildCounts;

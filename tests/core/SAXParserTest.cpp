@@ -20,7 +20,9 @@ class Recorder : public AbstractParseHandler {
 
   void StartElement(const UTF8String& ns, const UTF8String& local, const Attributes& attrs) override {
     std::string line = "start {" + ns + "}" + local;
-    for (const auto& [key, value] : attrs.All()) line += " {" + key.first + "}" + key.second + "=" + value;
+    for (const Attributes::Entry& a : attrs.All()) {
+      line += " {" + std::string(a.namespaceURI) + "}" + std::string(a.localName) + "=" + std::string(a.value);
+    }
     events.push_back(line);
     AbstractParseHandler::StartElement(ns, local, attrs);  // routes unqualified ones
   }
@@ -216,11 +218,27 @@ TEST(SAXParser, AttributesKeepOneValuePerNameInNameOrder) {
   attrs.Add("", "name", "first");
   attrs.Add("", "name", "second");  // replaces
   std::vector<std::string> listed;
-  for (const auto& [key, value] : attrs.All()) listed.push_back("{" + key.first + "}" + key.second + "=" + value);
+  for (const Attributes::Entry& a : attrs.All()) {
+    listed.push_back("{" + std::string(a.namespaceURI) + "}" + std::string(a.localName) + "=" +
+                     std::string(a.value));
+  }
   EXPECT_EQ(listed, (std::vector<std::string>{"{}name=second", "{}type=text", "{urn:ui}multiLine=true"}));
   EXPECT_EQ(attrs.Get("name"), "second");
   EXPECT_FALSE(attrs.Has("multiLine"));
   EXPECT_EQ(attrs.Find("multiLine", "urn:ui"), std::optional<std::string>("true"));
+
+  // Copies own their texts: they outlive the original.
+  std::optional<Attributes> original(attrs);
+  original->Add("", "label", std::string(40, 'L'));
+  Attributes copied(*original);
+  Attributes assigned;
+  assigned = *original;
+  original.reset();
+  for (const Attributes* copy : {&copied, &assigned}) {
+    EXPECT_EQ(copy->Get("label"), std::string(40, 'L'));
+    EXPECT_EQ(copy->Get("name"), "second");
+    EXPECT_EQ(copy->All().size(), 4u);
+  }
 
   // Elements one after the other: each sees only its own attributes.
   Recorder r;

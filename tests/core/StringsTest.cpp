@@ -15,6 +15,16 @@ TEST(Conversions, ValidTextRoundTripsThroughUTF16) {
   const UTF16String wide = ToUTF16(text);
   EXPECT_EQ(wide, (UTF16String{u'A', 0xE9, 0x20AC, 0xD83C, 0xDFA5, u'z'}));
   EXPECT_EQ(ToUTF8(wide), text);
+
+  // Long texts: characters and faults at every offset of the ASCII runs
+  // (the converter takes ASCII in blocks).
+  for (std::size_t at = 0; at <= 17; ++at) {
+    std::string mixed(at, 'x');
+    mixed += "\xC3\xA9" + std::string(9, 'y') + "\xF0\x9F\x8E\xA5\x80" + std::string(at, 'z');
+    UTF16String expected(at, u'x');
+    expected += u"\u00E9" + UTF16String(9, u'y') + u"\U0001F3A5\uFFFD" + UTF16String(at, u'z');
+    EXPECT_EQ(ToUTF16(mixed), expected) << at;
+  }
 }
 
 TEST(Conversions, InvalidUTF8BecomesReplacementWithoutEatingValidText) {

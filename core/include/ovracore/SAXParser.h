@@ -2,8 +2,10 @@
 #pragma once
 
 #include <cstddef>
+#include <forward_list>
 #include <memory>
 #include <optional>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -14,11 +16,22 @@ namespace ovracore {
 // Attributes of one element. Each keeps its namespace URI (empty for
 // unqualified attributes). Values are already decoded by the XML parser.
 // Elements carry a handful of attributes, so they sit in one small vector
-// kept in (namespace URI, local name) order rather than in a tree.
+// kept in (namespace URI, local name) order. The parser hands out views of
+// its own buffers, valid during the call; a copy owns its texts.
 class Attributes {
  public:
-  using Key = std::pair<UTF8String, UTF8String>;  // (namespace URI, local name)
-  using Entry = std::pair<Key, UTF8String>;
+  struct Entry {
+    std::string_view namespaceURI;
+    std::string_view localName;
+    std::string_view value;
+  };
+
+  Attributes() = default;
+  Attributes(const Attributes& other);
+  Attributes(Attributes&&) noexcept = default;
+  Attributes& operator=(const Attributes& other);
+  Attributes& operator=(Attributes&&) noexcept = default;
+  ~Attributes() = default;
 
   // Adding an attribute that is already there replaces its value.
   void Add(UTF8String namespaceURI, UTF8String localName, UTF8String value);
@@ -27,15 +40,19 @@ class Attributes {
   // The value of an attribute, or the empty string when it is absent.
   UTF8String Get(std::string_view localName, std::string_view namespaceURI = {}) const;
   bool Has(std::string_view localName, std::string_view namespaceURI = {}) const;
-  // Every attribute, ordered by namespace URI and then local name.
-  const std::vector<Entry>& All() const { return mValues; }
-  bool Empty() const { return mValues.empty(); }
+  // Every attribute, ordered by namespace URI and then local name. The views
+  // live as long as this object (or, in a handler, the call).
+  const std::vector<Entry>& All() const { return mEntries; }
+  bool Empty() const { return mEntries.empty(); }
 
  private:
   friend class AttributesFiller;
   const Entry* Lookup(std::string_view localName, std::string_view namespaceURI) const;
+  std::string_view Own(UTF8String text);
 
-  std::vector<Entry> mValues;
+  std::vector<Entry> mEntries;
+  // The texts of added and copied attributes; list nodes never move.
+  std::forward_list<UTF8String> mTexts;
 };
 
 // Handlers derive from this class and override what they need. Elements
