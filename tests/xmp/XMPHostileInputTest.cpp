@@ -263,11 +263,13 @@ TEST(XMPHostileInput, RelativePathsWithAFolderPartReachTheHandlers) {
 }
 
 TEST(XMPHostileInput, WritesReplaceTheFileInsteadOfRewritingItInPlace) {
-  // The MP4 handler would rewrite the original in place; through a
-  // temporary file, the path ends up at a new inode.
+  // The MP4 handler would rewrite the original in place; through a copy
+  // that replaces it, the path ends up at a new inode with the same
+  // permissions, and nothing else is left in the folder.
   ovratest::TempDir dir;
   const std::string path = (dir / "safe.mp4").string();
   ovratest::WriteFile(path, Mp4());
+  ASSERT_EQ(chmod(path.c_str(), 0640), 0);
   struct stat before {};
   ASSERT_EQ(stat(path.c_str(), &before), 0);
   {
@@ -280,6 +282,8 @@ TEST(XMPHostileInput, WritesReplaceTheFileInsteadOfRewritingItInPlace) {
   struct stat after {};
   ASSERT_EQ(stat(path.c_str(), &after), 0);
   EXPECT_NE(before.st_ino, after.st_ino);
+  EXPECT_EQ(after.st_mode & 07777, 0640u);
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir.path()), std::filesystem::directory_iterator()), 1);
   XMPFiles file(path, kXMP_UnknownFile, kRead);
   XMPMeta meta;
   ASSERT_TRUE(file.GetXMP(&meta));

@@ -1,11 +1,16 @@
 // Media files through the toolkit's handlers; .xmp sidecars by the layer.
 #include <ovraxmp/XMPFiles.h>
 
+#include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <sstream>
+#include <utility>
 
 #include <ovracore/FileSupport.h>
 #include <ovracore/Strings.h>
@@ -35,6 +40,52 @@ std::string ToolkitPath(const std::string& utf8) {
   fs::path absolute = fs::absolute(PathOf(utf8), ec);
   if (ec) return utf8;
   return absolute.lexically_normal().u8string();
+}
+
+// A copy of the file beside it (same folder, so that a rename replaces the
+// original atomically; same extension, which the handlers look at), with
+// the original's permission bits. Empty when it cannot be made.
+std::string CopyBeside(const std::string& target) {
+  const fs::path path = PathOf(target);
+  const std::string ext = path.extension().u8string();
+  std::string name = (path.parent_path() / ("." + path.filename().u8string() + ".ovra-XXXXXX" + ext)).u8string();
+  const int out = ::mkstemps(name.data(), static_cast<int>(ext.size()));
+  if (out < 0) return std::string();
+  bool ok = false;
+  const int in = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+  struct stat info {};
+  if (in >= 0 && ::fstat(in, &info) == 0) {
+    ok = ::fchmod(out, info.st_mode & 07777) == 0;
+    std::vector<char> buffer(1 << 20);
+    for (ssize_t got; ok && (got = ::read(in, buffer.data(), buffer.size())) != 0;) {
+      if (got < 0) {
+        ok = errno == EINTR;
+        continue;
+      }
+      for (ssize_t done = 0; ok && done < got;) {
+        const ssize_t put = ::write(out, buffer.data() + done, static_cast<std::size_t>(got - done));
+        if (put < 0) {
+          ok = errno == EINTR;
+        } else {
+          done += put;
+        }
+      }
+    }
+  }
+  if (in >= 0) ::close(in);
+  if (::close(out) != 0) ok = false;
+  if (!ok) {
+    ::unlink(name.c_str());
+    return std::string();
+  }
+  return name;
+}
+
+bool SyncFile(const std::string& utf8) {
+  const int fd = ::open(PathOf(utf8).c_str(), O_RDONLY | O_CLOEXEC);
+  if (fd < 0) return false;
+  const bool ok = ::fsync(fd) == 0;
+  return ::close(fd) == 0 && ok;
 }
 
 bool IsSidecarPath(const std::string& utf8) {
@@ -74,6 +125,7 @@ XMPFiles::XMPFiles(const std::string& filePath, XMP_FileFormat format, XMP_Optio
 
 XMPFiles::~XMPFiles() {
   if (mFile) xmp_files_free(F(mFile));
+  if (!mWorkCopy.empty()) ::unlink(PathOf(mWorkCopy).c_str());
 }
 
 bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_OptionBits openFlags) {
@@ -108,12 +160,40 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
       mPending.clear();
       return true;
     }
+    // An update goes to a copy beside the file, which replaces the original
+    // in one rename at close: a failed or interrupted write leaves the
+    // original as it was. (The toolkit's own safe update moves the original
+    // aside first, so an interruption can leave nothing under its name.)
+    // Formats spread over folders, or whose handler cannot rewrite a whole
+    // file, are updated by the handler in place.
+    std::string target = ToolkitPath(filePath);
+    std::string workCopy;
+    if (forUpdate) {
+      if (access(PathOf(target).c_str(), W_OK) != 0) return false;
+      std::error_code ec;
+      const fs::path resolved = fs::canonical(PathOf(target), ec);
+      if (!ec) target = resolved.u8string();
+      XMP_OptionBits handler = 0;
+      if (GetFormatInfo(CheckFileFormat(target), &handler) && (handler & kXMPFiles_AllowsSafeUpdate) &&
+          !(handler & kXMPFiles_FolderBasedFormat)) {
+        workCopy = CopyBeside(target);
+        if (workCopy.empty()) return false;
+      }
+    }
     XmpFilePtr file = xmp_files_new();
-    if (!file) detail::ThrowLastError(kXMPErr_NoMemory, "creating a file object");
-    if (!xmp_files_open(file, ToolkitPath(filePath).c_str(), static_cast<XmpOpenFileOptions>(openFlags))) {
+    if (!file) {
+      if (!workCopy.empty()) ::unlink(PathOf(workCopy).c_str());
+      detail::ThrowLastError(kXMPErr_NoMemory, "creating a file object");
+    }
+    const std::string& toolkitPath = workCopy.empty() ? target : workCopy;
+    if (!xmp_files_open(file, toolkitPath.c_str(), static_cast<XmpOpenFileOptions>(openFlags))) {
       xmp_files_free(file);
+      if (!workCopy.empty()) ::unlink(PathOf(workCopy).c_str());
       return false;
     }
+    mWorkCopy = workCopy;
+    mTarget = target;
+    mPut = false;
     // The toolkit stores flag combinations outside the enums' ranges: read
     // them as plain integers.
     std::uint32_t options = 0, type = XMP_FT_UNKNOWN, handler = 0;
@@ -151,14 +231,29 @@ void XMPFiles::CloseFile(XMP_OptionBits closeFlags) {
   if (!mFile) return;  // refused: nothing was opened
   XmpFilePtr file = F(mFile);
   mFile = nullptr;
-  // Whenever the handler can, it writes a new file and swaps it in, so a
-  // failed or interrupted write leaves the original as it was.
-  if ((mOpenFlags & kXMPFiles_OpenForUpdate) && (mHandlerFlags & kXMPFiles_AllowsSafeUpdate))
-    closeFlags |= kXMPFiles_UpdateSafely;
+  const std::string workCopy = std::exchange(mWorkCopy, std::string());
+  // The work copy is written in place; the original is replaced below.
+  if (!workCopy.empty()) closeFlags &= ~kXMPFiles_UpdateSafely;
   const bool ok = xmp_files_close(file, static_cast<XmpCloseFileOptions>(closeFlags));
   const int id = ok ? 0 : xmp_get_error();
   xmp_files_free(file);
-  if (!ok) detail::Throw(id != 0 ? id : kXMPErr_ExternalFailure, "closing \"" + mPath + "\"");
+  if (workCopy.empty()) {
+    if (!ok) detail::Throw(id != 0 ? id : kXMPErr_ExternalFailure, "closing \"" + mPath + "\"");
+    return;
+  }
+  const auto copy = PathOf(workCopy);
+  if (!ok) {
+    ::unlink(copy.c_str());
+    detail::Throw(id != 0 ? id : kXMPErr_ExternalFailure, "closing \"" + mPath + "\"");
+  }
+  if (!mPut) {  // nothing was written: the original stays, untouched
+    ::unlink(copy.c_str());
+    return;
+  }
+  if (!SyncFile(workCopy) || ::rename(copy.c_str(), PathOf(mTarget).c_str()) != 0) {
+    ::unlink(copy.c_str());
+    detail::Throw(kXMPErr_ExternalFailure, "writing \"" + mPath + "\"");
+  }
 }
 
 bool XMPFiles::GetFileInfo(std::string* filePath, XMP_OptionBits* openFlags, XMP_FileFormat* format,
@@ -251,6 +346,7 @@ void XMPFiles::PutXMP(const XMPMeta& xmpObj) {
   const XMPMeta clean = WithoutTransient(xmpObj);
   if (!xmp_files_put_xmp(F(mFile), clean.GetInternalRef()->Xmp()))
     detail::ThrowLastError(kXMPErr_BadFileFormat, "writing XMP into \"" + mPath + "\"");
+  mPut = true;
 }
 
 std::string XMPFiles::GetVersionInfo() {

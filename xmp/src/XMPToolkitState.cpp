@@ -13,6 +13,7 @@ namespace ovraxmp {
 namespace {
 
 std::mutex sStateMutex;
+std::mutex sRegistrationMutex;
 int sInitializationCount = 0;
 int sFilesInitializationCount = 0;
 std::atomic<bool> sToolkitUp{false};
@@ -100,7 +101,12 @@ bool XMPMeta::RegisterNamespace(const std::string& namespaceURI,
   if (namespaceURI.empty()) detail::Throw(kXMPErr_BadParam, "empty namespace URI");
   if (!IsValidPrefix(bare)) detail::Throw(kXMPErr_BadParam, "invalid namespace prefix \"" + suggestedPrefix + "\"");
   detail::XmpString actual;
-  xmp_register_namespace(namespaceURI.c_str(), bare.c_str(), actual);
+  {
+    // The toolkit's registry is process-wide; registrations from several
+    // threads are taken one at a time.
+    std::lock_guard<std::mutex> lock(sRegistrationMutex);
+    xmp_register_namespace(namespaceURI.c_str(), bare.c_str(), actual);
+  }
   // The toolkit's answer mixes "prefix taken" and failure; ask the registry.
   detail::XmpString now;
   if (!xmp_namespace_prefix(namespaceURI.c_str(), now))

@@ -37,9 +37,10 @@ class XMPFiles {
   bool OpenFile(const std::string& filePath, XMP_FileFormat format = kXMP_UnknownFile,
                 XMP_OptionBits openFlags = 0);
   // Writes the packet given to PutXMP (when opened for update) and closes.
-  // Writes go through a temporary file that replaces the original whenever
-  // the format's handler allows it (kXMPFiles_UpdateSafely is then implied).
-  // Closing a closed object does nothing.
+  // Whenever the format's handler allows a safe update, the write goes to a
+  // copy beside the file that then replaces it in one rename, so a failed or
+  // interrupted write leaves the original byte for byte (closeFlags do not
+  // matter then). Closing a closed object does nothing.
   void CloseFile(XMP_OptionBits closeFlags = 0);
   // False when no file is open. Any out pointer may be null.
   bool GetFileInfo(std::string* filePath = nullptr, XMP_OptionBits* openFlags = nullptr,
@@ -86,6 +87,9 @@ class XMPFiles {
   std::string mPending;  // sidecar packet to write at close
   bool mHasPending = false;
   std::string mRefusal;
+  std::string mWorkCopy;  // the copy an update is written to, empty when in place
+  std::string mTarget;    // the file the work copy replaces
+  bool mPut = false;
 };
 
 }  // namespace ovraxmp
