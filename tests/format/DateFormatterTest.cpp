@@ -1,5 +1,4 @@
 // XMP dates shown in the application language and the local time zone.
-#include <cstdlib>
 #include <ctime>
 #include <string>
 
@@ -9,6 +8,7 @@
 
 #include <ovracore/Localizer.h>
 
+#include "TestSupport.h"
 #include "format/FormatInternal.h"
 
 namespace ovrametadata {
@@ -21,37 +21,26 @@ const std::string kNNBSP = "\xE2\x80\xAF";
 // and for ICU, which caches its default zone) for one test.
 class PinnedLocaleAndZone {
  public:
-  PinnedLocaleAndZone(const char* language, const char* zone)
-      : mLanguage(ovracore::ApplicationLanguage()) {
-    const char* previous = std::getenv("TZ");
-    mHadZone = previous != nullptr;
-    if (previous) mZone = previous;
+  PinnedLocaleAndZone(const char* language, const char* zone) : mZone("TZ", zone) {
     ovracore::SetApplicationLanguage(language);
-    Apply(zone);
+    tzset();
+    icu::TimeZone::adoptDefault(icu::TimeZone::createTimeZone(icu::UnicodeString::fromUTF8(zone)));
   }
-  ~PinnedLocaleAndZone() {
-    ovracore::SetApplicationLanguage(mLanguage);
-    if (mHadZone) {
-      Apply(mZone.c_str());
-    } else {
-      unsetenv("TZ");
-      tzset();
-      icu::TimeZone::adoptDefault(icu::TimeZone::detectHostTimeZone());
-    }
-  }
+  ~PinnedLocaleAndZone() { ovracore::SetApplicationLanguage(mLanguage); }
   PinnedLocaleAndZone(const PinnedLocaleAndZone&) = delete;
   PinnedLocaleAndZone& operator=(const PinnedLocaleAndZone&) = delete;
 
  private:
-  static void Apply(const char* zone) {
-    setenv("TZ", zone, 1);
-    tzset();
-    icu::TimeZone::adoptDefault(icu::TimeZone::createTimeZone(icu::UnicodeString::fromUTF8(zone)));
-  }
-
-  std::string mLanguage;
-  bool mHadZone = false;
-  std::string mZone;
+  // Destroyed after mZone has restored TZ: both libraries follow it again.
+  struct FollowRestoredZone {
+    ~FollowRestoredZone() {
+      tzset();
+      icu::TimeZone::adoptDefault(icu::TimeZone::detectHostTimeZone());
+    }
+  };
+  std::string mLanguage = ovracore::ApplicationLanguage();
+  FollowRestoredZone mFollow;
+  ovratest::ScopedEnv mZone;
 };
 
 TEST(FormatDate, ShownInTheApplicationLanguageAndLocalZone) {

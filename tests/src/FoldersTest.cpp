@@ -59,10 +59,8 @@ TEST(Folders, XMPFilesPluginsLieBelowTheApplicationPluginFolder) {
 TEST(Folders, OnlyDICOMAndMobileAreExcludedFromTheGlobalFolder) {
   EXPECT_TRUE(IsSchemaExcludedFromGlobal(u"DICOM.xml"));
   EXPECT_TRUE(IsSchemaExcludedFromGlobal(u"Mobile.xml"));
-  EXPECT_FALSE(IsSchemaExcludedFromGlobal(u"dicom.xml"));
-  EXPECT_FALSE(IsSchemaExcludedFromGlobal(u"Mobile.XML"));
-  EXPECT_FALSE(IsSchemaExcludedFromGlobal(u"DICOM"));
-  EXPECT_FALSE(IsSchemaExcludedFromGlobal(u"Other.xml"));
+  for (const char16_t* name : {u"dicom.xml", u"Mobile.XML", u"DICOM", u"Other.xml"})
+    EXPECT_FALSE(IsSchemaExcludedFromGlobal(name)) << ovratest::U8(name);
 }
 
 }  // namespace
