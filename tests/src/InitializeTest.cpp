@@ -15,18 +15,12 @@ namespace fs = std::filesystem;
 
 namespace {
 
-std::string SchemaFile(const std::string& ns, const std::string& prefix,
-                       const std::string& properties = "", const std::string& extra = "") {
-  return "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<xmp_definitions>\n"
-         "<xmp_schema namespace=\"" + ns + "\" prefix=\"" + prefix + "\" " + extra + ">" +
-         properties + "</xmp_schema>\n</xmp_definitions>\n";
+std::string SchemaFile(const std::string& ns, const std::string& prefix, const std::string& properties = "") {
+  return "<xmp_definitions><xmp_schema namespace=\"" + ns + "\" prefix=\"" + prefix + "\">" + properties +
+         "</xmp_schema></xmp_definitions>\n";
 }
 
-std::vector<SchemaDefinitionPtr> ToVector(Range<SchemaDefinitionPtr> range) {
-  return std::vector<SchemaDefinitionPtr>(range.begin(), range.end());
-}
-
-bool Contains(const std::vector<SchemaDefinitionPtr>& schemas, const SchemaDefinitionPtr& schema) {
+bool Contains(const Range<SchemaDefinitionPtr>& schemas, const SchemaDefinitionPtr& schema) {
   return std::find(schemas.begin(), schemas.end(), schema) != schemas.end();
 }
 
@@ -121,9 +115,9 @@ TEST_F(StartUp, CustomFilesAreClassifiedAndFiledByPath) {
   ASSERT_TRUE(dynamic);
   EXPECT_TRUE(common->isCustom);
   EXPECT_FALSE(dynamic->isCustom);
-  EXPECT_TRUE(Contains(ToVector(CommonSchemaDefinitions()), common));
-  EXPECT_FALSE(Contains(ToVector(CommonSchemaDefinitions()), dynamic));
-  EXPECT_TRUE(Contains(ToVector(DynamicSchemaDefinitions()), dynamic));
+  EXPECT_TRUE(Contains(CommonSchemaDefinitions(), common));
+  EXPECT_FALSE(Contains(CommonSchemaDefinitions(), dynamic));
+  EXPECT_TRUE(Contains(DynamicSchemaDefinitions(), dynamic));
 
   const std::u16string path = Path(user / "Custom.xml");
   EXPECT_EQ(allSchemasFromSourceFile(path).size(), 2u);
@@ -196,14 +190,14 @@ TEST_F(StartUp, PackageSchemaFilesMergeAndAreNeverCustom) {
   const std::string dcNs = "http://purl.org/dc/elements/1.1/";
   const auto dc = NamespaceDefinition(dcNs);
   ASSERT_TRUE(dc);
-  const std::size_t commonBefore = ToVector(CommonSchemaDefinitions()).size();
+  const auto commonBefore = boost::distance(CommonSchemaDefinitions());
   ovratest::WriteFile(package / "schema.xml",
                       SchemaFile(dcNs, "dc", "<xmp_property name=\"pkgExtra\" type=\"text\"/>") +
                           SchemaFile("http://example.com/startup/pkg/", "spkg"));
   LoadDefinitionsFromFile(ovracore::filesupport::File(U16((package / "schema.xml").string())), false);
   EXPECT_TRUE(PropertyNameDefinition(dc, "pkgExtra"));
   // A merging load lists no schema as new, even the one that registered.
-  EXPECT_EQ(ToVector(CommonSchemaDefinitions()).size(), commonBefore);
+  EXPECT_EQ(boost::distance(CommonSchemaDefinitions()), commonBefore);
 }
 
 TEST_F(StartUp, MakerSchemasInCustomFilesAreNotCustom) {
@@ -219,7 +213,7 @@ TEST_F(StartUp, MakerSchemasInCustomFilesAreNotCustom) {
   ASSERT_TRUE(reloaded);
   EXPECT_NE(reloaded, builtIn);
   EXPECT_FALSE(reloaded->isCustom);
-  EXPECT_TRUE(Contains(ToVector(CommonSchemaDefinitions()), reloaded));
+  EXPECT_TRUE(Contains(CommonSchemaDefinitions(), reloaded));
 }
 
 TEST_F(StartUp, MissingResourcesAndFoldersAreSkippedSilently) {
