@@ -36,7 +36,7 @@ TEST(DefinitionsParser, ReadsEveryAttributeOfSchemasPropertiesAndTypes) {
       <xmp_field name="x" type="real" namespace="http://example.com/pt/" prefix="pt"/>
     </xmp_type>)"),
                                                 kSource);
-  EXPECT_TRUE(since.New().empty()) << since.Texts().front();
+  since.Expect(kDefinitionParsingError, kSource, {});
   ASSERT_EQ(result.first.size(), 1u);
   const auto& schema = *result.first[0];
   EXPECT_EQ(schema.namespaceURI, "http://example.com/p/");
@@ -50,12 +50,12 @@ TEST(DefinitionsParser, ReadsEveryAttributeOfSchemasPropertiesAndTypes) {
 
   const auto& rating = *schema.properties[0];
   EXPECT_EQ(rating.name, "rating");
-  EXPECT_EQ(rating.type, Text(("closedchoice")));
-  EXPECT_EQ(rating.constraints.elementType, Text(("integer")));
+  EXPECT_EQ(rating.type, Text("closedchoice"));
+  EXPECT_EQ(rating.constraints.elementType, Text("integer"));
   EXPECT_TRUE(rating.isInternal);
   EXPECT_EQ(rating.constraints.min, boost::make_optional(-1.0));
   EXPECT_EQ(rating.constraints.max, boost::make_optional(5.0));
-  EXPECT_EQ(rating.constraints.pattern, Text(("[0-9]")));
+  EXPECT_EQ(rating.constraints.pattern, Text("[0-9]"));
   EXPECT_EQ(rating.constraints.deprecated, boost::make_optional(true));
   ASSERT_TRUE(rating.uiHints);
   EXPECT_FALSE(rating.uiHints->separatorAfter);
@@ -81,7 +81,7 @@ TEST(DefinitionsParser, ReadsEveryAttributeOfSchemasPropertiesAndTypes) {
   ASSERT_EQ(point.fields.size(), 1u);
   EXPECT_EQ(point.fields[0]->namespaceURI, "http://example.com/pt/");
   EXPECT_EQ(point.fields[0]->prefix, "pt");
-  EXPECT_EQ(point.fields[0]->type, Text(("real")));
+  EXPECT_EQ(point.fields[0]->type, Text("real"));
 }
 
 TEST(DefinitionsParser, LabelsAreLocalisedAndTheirSourcesKept) {
