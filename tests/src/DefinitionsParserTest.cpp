@@ -36,7 +36,7 @@ TEST(DefinitionsParser, ReadsEveryAttributeOfSchemasPropertiesAndTypes) {
       <xmp_field name="x" type="real" namespace="http://example.com/pt/" prefix="pt"/>
     </xmp_type>)"),
                                                 kSource);
-  since.Expect(kDefinitionParsingError, kSource, {});
+  since.ExpectNone();
   ASSERT_EQ(result.first.size(), 1u);
   const auto& schema = *result.first[0];
   EXPECT_EQ(schema.namespaceURI, "http://example.com/p/");

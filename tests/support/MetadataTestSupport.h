@@ -34,6 +34,7 @@ class ErrorsSince {
     for (const auto& info : New()) texts.push_back(U8(info.message));
     return texts;
   }
+  void ExpectNone() const { EXPECT_EQ(Texts(), std::vector<std::string>()); }
   // Exactly these reports came, in this order, each of `type` from `source`.
   void Expect(ovrametadata::ErrorType type, const std::u16string& source,
               const std::vector<std::string>& texts) const {
