@@ -302,19 +302,21 @@ TEST(BuiltinDefinitions, StructPropertiesCarryTheirFieldsInTheirNamespaces) {
       for (const auto& field : type->fields) fields[field->name] = *field;
     return fields;
   };
+  // Fields in the property's own namespace and prefix.
   const struct {
     const char* namespaceURI;
     const char* property;
+    const char* prefix;
     std::size_t fieldCount;  // 0: not checked
     std::vector<const char*> fields;
   } structs[] = {
-      {kIptcCore, "CreatorContactInfo", 0,
+      {kIptcCore, "CreatorContactInfo", "Iptc4xmpCore", 0,
        {"CiAdrExtadr", "CiAdrCity", "CiAdrRegion", "CiAdrPcode", "CiAdrCtry", "CiTelWork", "CiEmailWork",
         "CiUrlWork"}},
-      {kDM, "duration", 2, {"value", "scale"}},
-      {kDM, "markers", 0, {"startTime", "duration", "comment", "name", "type", "cuePointParams"}},
-      {kPlus, "Licensee", 2, {"LicenseeName", "LicenseeID"}},
-      {kExif, "Flash", 5, {"Fired", "Return", "Mode", "Function", "RedEyeMode"}},
+      {kDM, "duration", "xmpDM", 2, {"value", "scale"}},
+      {kDM, "markers", "xmpDM", 0, {"startTime", "duration", "comment", "name", "type", "cuePointParams"}},
+      {kPlus, "Licensee", "plus", 2, {"LicenseeName", "LicenseeID"}},
+      {kExif, "Flash", "exif", 5, {"Fired", "Return", "Mode", "Function", "RedEyeMode"}},
   };
   for (const auto& s : structs) {
     SCOPED_TRACE(s.property);
@@ -325,8 +327,11 @@ TEST(BuiltinDefinitions, StructPropertiesCarryTheirFieldsInTheirNamespaces) {
     for (const char* name : s.fields) {
       ASSERT_EQ(fields.count(name), 1u) << name;
       EXPECT_EQ(fields.at(name).namespaceURI, s.namespaceURI) << name;
+      EXPECT_EQ(fields.at(name).prefix, s.prefix) << name;
     }
   }
+  for (const auto& [name, field] : fieldsOf(kIptcCore, "CreatorContactInfo"))
+    EXPECT_EQ(field.type, boost::make_optional(UTF8String("text"))) << name;
   // Field types, element types and prefixes, including IPTC locations that
   // borrow the EXIF GPS fields.
   const struct {

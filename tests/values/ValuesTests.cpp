@@ -254,12 +254,14 @@ TEST_F(ValuesTest, MultiValuedPropertyReadsAsMixedAndIsAlwaysWritten) {
 
 TEST_F(ValuesTest, EachFormIsWrittenInItsStorageForm) {
   std::string item;
-  // Stored as two items and read back as "one; two": only spaces differ,
-  // so the verification after the write reports nothing.
-  EXPECT_TRUE(SetValue(Packet(), P("Keywords"), "one;two"));
+  EXPECT_TRUE(SetValue(Packet(), P("Keywords"), "one; two"));
   ASSERT_EQ(mMeta.CountArrayItems(kNS, "Keywords"), 2);
   mMeta.GetArrayItem(kNS, "Keywords", 2, &item);
   EXPECT_EQ(item, "two");
+  // Stored as two items and read back as "three; four": only spaces differ,
+  // so the verification after the write reports nothing.
+  EXPECT_TRUE(SetValue(Packet(), P("Keywords"), "three;four"));
+  EXPECT_EQ(mMeta.CountArrayItems(kNS, "Keywords"), 2);
 
   mMeta.DeleteProperty(kNS, "Steps");
   EXPECT_TRUE(SetValue(Packet(), P("Steps"), "first; \"se;cond\""));
