@@ -5,12 +5,12 @@
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
-#include <fstream>
 #include <iostream>
 #include <memory>
 #include <set>
 
 #include <boost/make_shared.hpp>
+#include <fcntl.h>
 #include <nlohmann/json.hpp>
 #include <unistd.h>
 
@@ -98,24 +98,31 @@ struct OpenedFile {
 // XMP gives a provider without metadata.
 bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out) {
   std::error_code error;
-  if (!std::filesystem::exists(name, error)) {
+  // One status for both checks: runs over many files pay per system call.
+  const auto status = std::filesystem::status(name, error);
+  if (!std::filesystem::exists(status)) {
     reporter.Error(name, "cannot read file: No such file or directory", kExitUsage);
     return false;
   }
-  if (!std::filesystem::is_regular_file(name, error)) {
+  if (!std::filesystem::is_regular_file(status)) {
     reporter.Error(name, "cannot read file: not a regular file", kExitUsage);
     return false;
   }
-  {
-    std::ifstream probe(name, std::ios::binary);
-    if (!probe) {
-      reporter.Error(name, std::string("cannot read file: ") + std::strerror(errno), kExitUsage);
-      return false;
-    }
+  const int probe = ::open(name.c_str(), O_RDONLY | O_CLOEXEC);
+  if (probe < 0) {
+    reporter.Error(name, std::string("cannot read file: ") + std::strerror(errno), kExitUsage);
+    return false;
   }
+  ::close(probe);
   // Media applications hand the toolkit absolute paths; its handlers for
-  // folder-based formats misread relative ones with a folder in them.
-  const UTF16String path = ToUTF16(std::filesystem::absolute(name, error).lexically_normal().string());
+  // folder-based formats misread relative ones with a folder in them. The
+  // working folder is asked once.
+  static const std::filesystem::path workingFolder = std::filesystem::current_path(error);
+  const std::filesystem::path given(name);
+  const std::filesystem::path absolute =
+      given.is_absolute() || workingFolder.empty() ? std::filesystem::absolute(given, error)
+                                                   : workingFolder / given;
+  const UTF16String path = ToUTF16(absolute.lexically_normal().string());
   auto provider = boost::make_shared<FileProvider>(path);
   reporter.FlushLibrary(name);
   if (!provider->MetaDataAccess() && utility::GetXMPFormat(path) == kUnknownFormat) {

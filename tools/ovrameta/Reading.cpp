@@ -23,10 +23,19 @@ bool IsBagOrSeq(const boost::optional<PrimitiveType>& primitive) {
   return primitive && (*primitive == kPrimitiveType_bag || *primitive == kPrimitiveType_seq);
 }
 
+// Whether the packet stores a value at path. The list of stored paths,
+// when there is one, answers without a query per path (a run over many
+// files asks for every field and item of every stored property).
+bool IsStored(XMPMetaRef xmp, const Path& path, const ReadOptions& options) {
+  if (!options.stored) return HasValue(xmp, path);
+  return options.stored->count(path.description) != 0;
+}
+
 // The text as stored: the library formats internal properties for display
 // unless metadata is forced writable, so the switch is on during the read.
-boost::optional<std::string> ReadStoredText(XMPMetaRef xmp, const Path& path) {
-  if (!HasValue(xmp, path)) return boost::none;
+boost::optional<std::string> ReadStoredText(XMPMetaRef xmp, const Path& path,
+                                            const ReadOptions& options) {
+  if (!IsStored(xmp, path, options)) return boost::none;
   const bool forced = IsAllMetadataForcedWritable();
   if (!forced) ForcedAllMetadataWritable(true);
   UTF8String text;
@@ -45,7 +54,7 @@ std::string DisplayText(const EntryDefinition& entry, const std::string& value) 
 
 // Items are probed one by one, which works for arrays at any depth.
 template <class Visit>
-void ForEachItem(XMPMetaRef xmp, const Path& arrayPath, Visit visit) {
+void ForEachItem(XMPMetaRef xmp, const Path& arrayPath, const ReadOptions& options, Visit visit) {
   for (int index = 1; index <= kMaxItems; ++index) {
     Path item;
     try {
@@ -53,7 +62,7 @@ void ForEachItem(XMPMetaRef xmp, const Path& arrayPath, Visit visit) {
     } catch (const std::exception&) {
       return;
     }
-    if (item.description.empty() || !HasValue(xmp, item)) return;
+    if (item.description.empty() || !IsStored(xmp, item, options)) return;
     visit(item, index);
   }
 }
@@ -87,7 +96,7 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
                const ReadOptions& options, ValueNode& out,
                boost::shared_ptr<EntryDefinition> entry) {
   if (!xmp || path.description.empty()) return false;
-  if (!HasValue(xmp, path)) {
+  if (!IsStored(xmp, path, options)) {
     if (!path.internal) return false;
     if (!entry) entry = PathEntryDefinition(path);
     return entry && ReadConstructedValue(xmp, path, name, *entry, options.types, out);
@@ -132,9 +141,9 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
       }
       if (!found) return false;
       node.value = text;
-      if (options.raw) node.raw = ReadStoredText(xmp, path);
+      if (options.raw) node.raw = ReadStoredText(xmp, path, options);
       if (options.items) {
-        ForEachItem(xmp, path, [&](const Path& item, int index) {
+        ForEachItem(xmp, path, options, [&](const Path& item, int index) {
           ValueNode child;
           const std::string itemName = name + "[" + std::to_string(index) + "]";
           if (ReadValue(xmp, item, itemName, options, child)) {
@@ -146,7 +155,7 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
       out = std::move(node);
       return true;
     }
-      ForEachItem(xmp, path, [&](const Path& item, int index) {
+      ForEachItem(xmp, path, options, [&](const Path& item, int index) {
       ValueNode child;
       const std::string itemName = name + "[" + std::to_string(index) + "]";
       if (ReadValue(xmp, item, itemName, options, child)) {
@@ -175,7 +184,7 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
     const UTF8String formatted = FormatValue(xmp, path, text);
     if (!formatted.empty()) node.value = formatted;
   }
-  if (options.raw) node.raw = ReadStoredText(xmp, path);
+  if (options.raw) node.raw = ReadStoredText(xmp, path, options);
   out = std::move(node);
   return true;
 }
@@ -220,21 +229,21 @@ const std::vector<SchemaRef>& KnownProperties() {
 
 namespace {
 
-// The local names of the top-level properties that the provider's packet
-// stores in namespaceURI: the aggregate provider lists every stored
-// property path of a namespace, which spares asking for each of the
-// hundreds of defined properties in turn.
-std::set<std::string> StoredPropertyNames(AggregateProvider& presence,
-                                          const std::string& namespaceURI) {
+// What the provider's packet stores in namespaceURI: the aggregate provider
+// lists every stored property path of a namespace, which spares asking for
+// each of the hundreds of defined properties (and their fields and items)
+// in turn. names gets the local names of the top-level properties.
+void ListStored(AggregateProvider& presence, const std::string& namespaceURI, StoredPaths& paths,
+                std::set<std::string, std::less<>>& names) {
   std::vector<PropertyDefinitionPtr> stored;
   presence.GetAllPathsForDynamicSchema(namespaceURI, stored);
-  std::set<std::string> names;
+  paths.clear();
+  names.clear();
   for (const auto& property : stored) {
     if (!property) continue;
-    const auto end = property->name.find_first_of("/[?");
-    names.insert(property->name.substr(0, end));
+    paths.insert(property->name);
+    names.insert(property->name.substr(0, property->name.find_first_of("/[?")));
   }
-  return names;
 }
 
 }  // namespace
@@ -246,17 +255,25 @@ std::vector<SchemaValues> ReadAllValues(const boost::shared_ptr<MetaDataProvider
   XMPMetaRef xmp = *reader;
   if (!xmp) return all;
   auto presence = boost::dynamic_pointer_cast<AggregateProvider>(provider);
+  // One file: the listed paths are those of the packet read here, so they
+  // answer for every field and item too. An aggregate's merged packet need
+  // not hold what one of its members does; it is asked path by path.
+  const bool oneFile = !presence;
   if (!presence) {
     presence = boost::make_shared<AggregateProvider>();
     presence->AddProvider(provider, true);
   }
+  StoredPaths paths;
+  std::set<std::string, std::less<>> names;
+  ReadOptions schemaOptions = options;
+  if (oneFile) schemaOptions.stored = &paths;
   for (const auto& schema : KnownProperties()) {
-    const auto stored = StoredPropertyNames(*presence, schema.schema->namespaceURI);
+    ListStored(*presence, schema.schema->namespaceURI, paths, names);
     SchemaValues values;
     for (const auto& property : schema.properties) {
       ValueNode node;
-      if (stored.count(property.property->name)) {
-        if (ReadValue(xmp, property.path, property.name, options, node, property.property)) {
+      if (names.count(property.property->name)) {
+        if (ReadValue(xmp, property.path, property.name, schemaOptions, node, property.property)) {
           values.values.push_back(std::move(node));
         }
       } else if (property.path.internal &&

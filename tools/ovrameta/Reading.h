@@ -2,6 +2,8 @@
 // reading the values of a packet into a tree of display nodes.
 #pragma once
 
+#include <functional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -26,10 +28,17 @@ struct ValueNode {
   std::vector<ValueNode> children;   // fields of a structure, items of an array
 };
 
+// The paths a packet stores below one schema, written as Path::description
+// writes them ("subject[2]", "Flash/exif:Fired").
+using StoredPaths = std::set<std::string, std::less<>>;
+
 struct ReadOptions {
   bool raw = false;    // also read the stored text of every value
   bool items = true;   // read the items of arrays of simple values one by one
   bool types = false;  // describe the type of every value (typeText)
+  // When set, what the packet stores in the schema being read: looked up
+  // instead of asking the packet about every path.
+  const StoredPaths* stored = nullptr;
 };
 
 // Reads the value at path, named name. False when nothing is stored there
