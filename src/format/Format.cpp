@@ -2,7 +2,11 @@
 // turns a raw value into display text.
 #include "format/FormatInternal.h"
 
+#include <cstddef>
+#include <functional>
 #include <map>
+#include <string_view>
+#include <unordered_set>
 #include <utility>
 
 #include <boost/shared_ptr.hpp>
@@ -17,6 +21,16 @@ ValueFormatterFn sCustomFormatterFn;
 std::map<Path, ValueFormatterFn> sFormatterFnMap;
 std::map<Path, Path> sFallbackPathMap;
 std::map<Path, ValueAggregatorFn> sValueAggregatorFnMap;
+// Hashes of the paths of both tables above. A reader of all values asks
+// about every internal property of every file, and nearly none has an
+// entry: one hash lookup answers most questions instead of two tree walks
+// over long namespace URIs.
+std::unordered_set<std::size_t> sConstructedPathHashes;
+
+std::size_t PathHash(const Path& path) {
+  const std::hash<std::string_view> hash;
+  return hash(path.namespaceURI) * 31u + hash(path.description);
+}
 
 Path BuiltInPath(const char* namespaceURI, const char* propertyName) {
   return PathForSchemaNameAndPropertyName(UTF8String(namespaceURI), UTF8String(propertyName));
@@ -38,10 +52,12 @@ void AddValueFormatter(const Path& path, const ValueFormatterFn& formatter) {
 
 void AddFallbackPath(const Path& path, Path fallback) {
   sFallbackPathMap[path] = std::move(fallback);
+  sConstructedPathHashes.insert(PathHash(path));
 }
 
 void AddValueAggregator(const Path& path, const ValueAggregatorFn& aggregator) {
   sValueAggregatorFnMap[path] = aggregator;
+  sConstructedPathHashes.insert(PathHash(path));
 }
 
 UTF8String FormatValue(XMPMetaRef xmp, const Path& path, const UTF8String& rawValue) {
@@ -65,6 +81,7 @@ UTF8String FormatValue(XMPMetaRef xmp, const Path& path, const UTF8String& rawVa
 
 bool GetConstructedValue(XMPMetaRef xmp, const Path& path, UTF8String& outValue,
                          GetValueResult* outResult) {
+  if (sConstructedPathHashes.count(PathHash(path)) == 0) return false;
   const auto fallback = sFallbackPathMap.find(path);
   if (fallback != sFallbackPathMap.end() && GetValue(xmp, fallback->second, outValue, outResult))
     return true;
@@ -118,6 +135,7 @@ void ClearFormatterTables() {
   sFormatterFnMap.clear();
   sFallbackPathMap.clear();
   sValueAggregatorFnMap.clear();
+  sConstructedPathHashes.clear();
 }
 
 }  // namespace ovrametadata
