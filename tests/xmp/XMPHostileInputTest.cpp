@@ -111,6 +111,8 @@ TEST(XMPHostileInput, RealPacketsAreParsedAsBefore) {
   EXPECT_EQ(meta.CountArrayItems(kXMP_NS_DC, "subject"), 2400);
   EXPECT_EQ(meta.CountArrayItems("http://ns.adobe.com/xap/1.0/mm/", "History"), 1000);
   EXPECT_NO_THROW(xmptest::Parse(hostile::DeepResources(500)));
+  // Blank text is no packet (an empty buffer is an empty one).
+  EXPECT_EQ(xmptest::ErrorIdOf([] { xmptest::Parse(" \n\t "); }), kXMPErr_BadXML);
 }
 
 // ---- Media files ----

@@ -205,6 +205,7 @@ Quick QuickScan(const char* text, std::size_t n, std::string* problem) {
   std::vector<std::uint32_t> counts;
   std::vector<NodeKind> kinds;
   std::uint32_t topLevel = 0;
+  bool sawElement = false;
   const auto add = [&](std::uint32_t* count, std::uint32_t more) {
     *count += std::min<std::uint32_t>(more, kMaxPropertiesPerNode + 1);
     if (*count <= kMaxPropertiesPerNode) return true;
@@ -259,6 +260,7 @@ Quick QuickScan(const char* text, std::size_t n, std::string* problem) {
       } else if (parent == NodeKind::kRDF && local == "Description") {
         kind = NodeKind::kTopDescription;
       }
+      sawElement = true;
       std::uint32_t attributes = 0;
       bool open = false;
       for (;;) {
@@ -296,7 +298,7 @@ Quick QuickScan(const char* text, std::size_t n, std::string* problem) {
       i = k;
     }
   }
-  return counts.empty() ? Quick::kSane : Quick::kAskExpat;
+  return counts.empty() && sawElement ? Quick::kSane : Quick::kAskExpat;
 }
 
 }  // namespace
