@@ -70,5 +70,10 @@ int main(int argc, char** argv) {
   Write(media, "bare.mp3", Media(7, xmptest::media::Mp3()));
   Write(media, "sidecar.xmp", Media(10, packet));
   Write(media, "packet.bin", Media(11, "junk" + wrapped + "junk"));
+  for (const auto& entry : fs::directory_iterator(fs::path(OVRA_TEST_DATA_DIR) / "hostile")) {
+    const std::string ext = entry.path().extension().string();
+    const int index = ext == ".jpg" ? 0 : ext == ".mp4" ? 1 : ext == ".wav" ? 3 : 11;
+    Write(media, "hostile-" + entry.path().filename().string(), Media(index, Read(entry.path())));
+  }
   return 0;
 }

@@ -84,6 +84,27 @@ TEST(HostileInput, FilesThatTheHandlersMustNotOpenHoldNullMetadataAndAreNeverWri
   }
 }
 
+TEST(HostileInput, CheckedInHostileFilesStayUnreadAndUntouched) {
+  // Minimal inputs kept as regression cases, independent of the generators.
+  ovratest::TempDir dir;
+  const Path format = PathForSchemaNameAndPropertyName(UTF8String(ovraxmp::kXMP_NS_DC), "format");
+  int seen = 0;
+  for (const auto& entry : fs::directory_iterator(ovratest::DataDir() / "hostile")) {
+    ++seen;
+    const fs::path file = dir / entry.path().filename();
+    fs::copy_file(entry.path(), file);
+    const std::string bytes = ovratest::ReadFile(file);
+    auto provider = ovratest::OpenFile(file);
+    EXPECT_EQ(provider->MetaDataAccess(), nullptr) << file.filename();
+    Edit(provider, format, "overwritten");
+    EXPECT_EQ(ovratest::ReadFile(file), bytes) << file.filename();
+    const std::string ext = file.extension().string();
+    const XMP_FileFormat expected = ext == ".jpg" ? 0x4A504547 : ext == ".mp4" ? 0x4D503420 : 0x57415620;
+    EXPECT_EQ(utility::GetXMPFormat(ovratest::U16Path(file)), expected) << file.filename();
+  }
+  EXPECT_GE(seen, 8);
+}
+
 TEST(HostileInput, AliasedPropertiesAreReadQuietly) {
   const ovraxmp::XMPMeta packet = ovratest::Packet(
       "<dc:description><rdf:Alt><rdf:li xml:lang=\"x-default\">A harbour</rdf:li></rdf:Alt></dc:description>"
