@@ -201,6 +201,7 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
                                  reinterpret_cast<XmpFileType*>(&type),
                                  reinterpret_cast<XmpFileFormatOptions*>(&handler))) {
       xmp_files_free(file);
+      if (!mWorkCopy.empty()) ::unlink(PathOf(std::exchange(mWorkCopy, std::string())).c_str());
       return false;
     }
     mFile = file;
