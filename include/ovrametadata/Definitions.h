@@ -24,7 +24,7 @@ namespace ovrametadata {
 
 // The nine primitive kinds of value; the comment gives the type id used in
 // definitions files.
-enum PrimitiveType {
+enum PrimitiveType : int {
   kPrimitiveType_integer = 0,       // "integer"
   kPrimitiveType_real = 1,          // "real"
   kPrimitiveType_text = 2,          // "text"
@@ -38,7 +38,7 @@ enum PrimitiveType {
 
 // The standard schemas with built-in definitions resources (named after
 // the stem in the enumerator, followed by "_definitions").
-enum StandardSchema {
+enum StandardSchema : int {
   kStandardSchema_dc = 0,
   kStandardSchema_xmp = 1,
   kStandardSchema_xmpRights = 2,

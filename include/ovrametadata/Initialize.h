@@ -37,7 +37,7 @@ OVRAMETADATA_EXPORT UTF8String GetXMPFilesVersion();
 // What kind of operation failed. Each kind has its own localised format with
 // the reporter's message in place of "@0"; kPlainError uses the message as
 // it stands.
-enum ErrorType {
+enum ErrorType : int {
   kDefinitionParsingError = 0,
   kDefinitionRegistrationError = 1,
   kErrorReadingXMP = 2,
@@ -101,8 +101,9 @@ OVRAMETADATA_EXPORT bool IsAllMetadataForcedWritable();
 // Folders. Every function answers a full path, or an empty string when the
 // data root cannot be determined; none of them creates the folder.
 
-// The generation of the metadata-panel folder layout.
-enum VelkVersion { kPanelsVersion4 = 0, kPanelsVersion3 = 1, kPanelsVersion2 = 2 };
+// The generation of the metadata-panel folder layout. The underlying type is
+// fixed because callers may pass other values (they mean the oldest layout).
+enum VelkVersion : int { kPanelsVersion4 = 0, kPanelsVersion3 = 1, kPanelsVersion2 = 2 };
 
 // Custom definitions files of the machine and of the current user.
 OVRAMETADATA_EXPORT UTF16String CustomDefinitionsGlobalDirectory();

@@ -24,7 +24,7 @@
 namespace ovrametadata {
 
 // What QueryPathStatus is asked about a path.
-enum PathStatus {
+enum PathStatus : int {
   kPathStatusReadable = 0,
   kPathStatusWritable = 1,
 };

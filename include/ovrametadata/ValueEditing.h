@@ -22,7 +22,7 @@ struct Value {
 };
 
 // How ApplyTemplate merges a template into a packet.
-enum TemplateImportOptions {
+enum TemplateImportOptions : int {
   // Clear properties the template does not name; replace existing ones.
   TemplateReplaceAll = 0,
   // Clear properties the template does not name.

@@ -16,7 +16,7 @@ namespace ovrametadata {
 
 // The outcome of a read, written through the optional result pointer of
 // every reader (which sets ValueAbsent on entry).
-enum GetValueResult {
+enum GetValueResult : int {
   ValueFound = 0,   // the value exists and was read
   ValueMixed = 1,   // the toolkit marks the property multi-valued; nothing read
   ValueAbsent = 2,  // no packet, or the property does not exist
