@@ -296,4 +296,25 @@ TEST(XMPHostileInput, WritesReplaceTheFileInsteadOfRewritingItInPlace) {
   EXPECT_EQ(xmptest::Get(meta, kXMP_NS_DC, "format"), "video/mp4");
 }
 
+TEST(XMPHostileInput, WritesThroughASymbolicLinkReplaceTheFileItNames) {
+  ovratest::TempDir dir;
+  std::filesystem::create_directories(dir / "real");
+  const std::string real = (dir / "real" / "x.jpg").string();
+  ovratest::WriteFile(real, Jpeg());
+  std::filesystem::create_symlink("real/x.jpg", dir / "link.jpg");
+  {
+    XMPFiles file((dir / "link.jpg").string(), kXMP_UnknownFile, kUpdate);
+    XMPMeta meta;
+    meta.SetProperty(kXMP_NS_DC, "format", "image/jpeg");
+    file.PutXMP(meta);
+    file.CloseFile();
+  }
+  EXPECT_TRUE(std::filesystem::is_symlink(dir / "link.jpg"));
+  XMPFiles file(real, kXMP_UnknownFile, kRead);
+  XMPMeta meta;
+  ASSERT_TRUE(file.GetXMP(&meta));
+  EXPECT_EQ(xmptest::Get(meta, kXMP_NS_DC, "format"), "image/jpeg");
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir / "real"), std::filesystem::directory_iterator()), 1);
+}
+
 }  // namespace

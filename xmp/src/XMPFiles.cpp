@@ -34,12 +34,14 @@ bool IsRegularFile(const std::string& utf8) {
 }
 
 // The toolkit's file handlers mishandle relative paths with a folder part
-// ("c/x.jpg"): they only ever see absolute, normalised ones.
+// ("c/x.jpg"): they only ever see absolute ones, resolved the way the
+// system resolves them ("link/.." is not simply dropped).
 std::string ToolkitPath(const std::string& utf8) {
   std::error_code ec;
-  fs::path absolute = fs::absolute(PathOf(utf8), ec);
-  if (ec) return utf8;
-  return absolute.lexically_normal().u8string();
+  const fs::path resolved = fs::weakly_canonical(PathOf(utf8), ec);
+  if (!ec) return resolved.u8string();
+  const fs::path absolute = fs::absolute(PathOf(utf8), ec);
+  return ec ? utf8 : absolute.lexically_normal().u8string();
 }
 
 // A copy of the file beside it (same folder, so that a rename replaces the
@@ -170,9 +172,6 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
     std::string workCopy;
     if (forUpdate) {
       if (access(PathOf(target).c_str(), W_OK) != 0) return false;
-      std::error_code ec;
-      const fs::path resolved = fs::canonical(PathOf(target), ec);
-      if (!ec) target = resolved.u8string();
       XMP_OptionBits handler = 0;
       if (GetFormatInfo(CheckFileFormat(target), &handler) && (handler & kXMPFiles_AllowsSafeUpdate) &&
           !(handler & kXMPFiles_FolderBasedFormat)) {
