@@ -22,6 +22,24 @@ namespace {
 constexpr XMP_OptionBits kRead = kXMPFiles_OpenForRead | kXMPFiles_OpenAllowBackgroundFileOpen;
 constexpr XMP_OptionBits kUpdate = kXMPFiles_OpenForUpdate | kXMPFiles_OpenAllowBackgroundFileOpen;
 
+// The keyword of the PNG text chunk that carries XMP, taken from a file the
+// toolkit itself wrote, so that the hostile chunk is one the handler reads.
+std::string PngXMPKeyword() {
+  ovratest::TempDir dir;
+  const std::string path = (dir / "keyword.png").string();
+  ovratest::WriteFile(path, xmptest::media::Png());
+  {
+    XMPFiles file(path, kXMP_UnknownFile, kUpdate);
+    XMPMeta meta;
+    meta.SetProperty(kXMP_NS_DC, "format", "image/png");
+    file.PutXMP(meta);
+    file.CloseFile();
+  }
+  const std::string bytes = ovratest::ReadFile(path);
+  const std::size_t start = bytes.find("iTXt") + 4;
+  return bytes.substr(start, bytes.find('\0', start) - start);
+}
+
 // Sanity caps, far above what a refusal costs (speed is measured in bench/).
 constexpr double kMaxSeconds = 20;
 constexpr long kMaxExtraKB = 200 * 1024;
@@ -162,7 +180,7 @@ const FileCase kHostileFiles[] = {
      [] {
        const std::string png = xmptest::media::Png();
        const std::string itxt = xmptest::media::PngChunk(
-           "iTXt", std::string("XML:com.adobe.xmp\0\0\0\0\0", 22) + hostile::Wrapped(hostile::DeepResources(100000)));
+           "iTXt", PngXMPKeyword() + std::string(5, '\0') + hostile::Wrapped(hostile::DeepResources(100000)));
        return png.substr(0, 33) + itxt + png.substr(33);
      }},
 };
