@@ -4,10 +4,11 @@
 #include <algorithm>
 #include <utility>
 
-#include <ovracore/Localizer.h>
 #include <ovraxmp/XMPDocOps.h>
 #include <ovraxmp/XMPToolkit.h>
 #include <ovrametadata/Initialize.h>
+
+#include "values/ValuesInternal.h"
 
 namespace ovrametadata {
 
@@ -43,14 +44,9 @@ UTF8String ChangePartForPath(const Path& path) {
 // Reporting must not throw either: the guard's destructor calls it.
 void ReportWriteBackFailure(const MetaDataProvider& provider, const std::vector<Path>& paths) noexcept {
   try {
-    const std::string where = paths.empty() ? std::string()
-                                            : paths.front().namespaceURI + paths.front().description;
     const auto* file = dynamic_cast<const FileProvider*>(&provider);
-    SendError(kErrorWritingXMP,
-              ovracore::ZString("$$$/ovrametadata/ErrorInXMPData/InvalidData=invalid data in "
-                                "#{quot}@0#{quot}.",
-                                {where}),
-              file ? file->FilePath() : UTF16String());
+    ReportInvalidData(kErrorWritingXMP, paths.empty() ? Path() : paths.front(),
+                      file ? file->FilePath() : UTF16String());
   } catch (...) {
     // Out of memory while reporting: the write-back is abandoned all the same.
   }

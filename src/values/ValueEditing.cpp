@@ -14,6 +14,8 @@
 #include <ovrametadata/Initialize.h>
 #include <ovrametadata/Providers.h>
 
+#include "values/ValuesInternal.h"
+
 namespace ovrametadata {
 
 namespace {
@@ -22,15 +24,6 @@ constexpr const char kMultiFileCount[] = "MultiFileCount";
 constexpr const char kDeletedProperties[] = "DeletedProperties";
 constexpr const char kDelURI[] = "DelURI";
 constexpr const char kDelPath[] = "DelPath";
-
-void ReportInvalidData(ErrorType type, const Path& path) {
-  // The namespace runs straight into the path in this message, on purpose.
-  SendError(type,
-            ovracore::ZString("$$$/ovrametadata/ErrorInXMPData/InvalidData=invalid data in "
-                              "#{quot}@0#{quot}.",
-                              {path.namespaceURI + path.description}),
-            UTF16String());
-}
 
 // The 1-based toolkit index of a 0-based index; the last-item marker passes.
 ovraxmp::XMP_Index ToolkitIndex(int index) {

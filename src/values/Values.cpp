@@ -16,8 +16,17 @@
 #include <ovrametadata/Initialize.h>
 
 #include "paths/PathsInternal.h"
+#include "values/ValuesInternal.h"
 
 namespace ovrametadata {
+
+void ReportInvalidData(ErrorType type, const Path& path, const UTF16String& source) {
+  SendError(type,
+            ovracore::ZString("$$$/ovrametadata/ErrorInXMPData/InvalidData=invalid data in "
+                              "#{quot}@0#{quot}.",
+                              {path.namespaceURI + path.description}),
+            source);
+}
 
 namespace {
 
@@ -31,16 +40,6 @@ const char kDateTypeId[] = "date";
 
 void SetResult(GetValueResult* result, GetValueResult value) {
   if (result) *result = value;
-}
-
-// The URI is deliberately run into the path: that is how the message has
-// always shown the property.
-void ReportInvalidData(ErrorType type, const Path& path) {
-  SendError(type,
-            ovracore::ZString("$$$/ovrametadata/ErrorInXMPData/InvalidData=invalid data in "
-                              "#{quot}@0#{quot}.",
-                              {path.namespaceURI + path.description}),
-            UTF16String());
 }
 
 bool IsDateEntry(const EntryDefinition& entry) {

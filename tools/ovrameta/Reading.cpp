@@ -127,43 +127,36 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
 
   if (IsBagOrSeq(primitive)) {
     node.kind = ValueNode::kArray;
+    const auto readItems = [&] {
+      ForEachItem(xmp, path, options, [&](const Path& item, int index) {
+        ValueNode child;
+        const std::string itemName = name + "[" + std::to_string(index) + "]";
+        if (ReadValue(xmp, item, itemName, options, child)) {
+          child.label = "[" + std::to_string(index) + "]";
+          node.children.push_back(std::move(child));
+        }
+      });
+    };
     const auto elementType = PropertyTypeOf(*entry);
-    const bool structItems = elementType && !elementType->fields.empty();
-    if (!structItems) {
-      // Read as a whole first: that is where an aggregate says "mixed".
-      UTF8String text;
-      GetValueResult result = ValueAbsent;
-      const bool found = GetValue(xmp, path, text, &result);
-      if (result == ValueMixed) {
-        node.mixed = true;
-        out = std::move(node);
-        return true;
-      }
-      if (!found) return false;
-      node.value = text;
-      if (options.raw) node.raw = ReadStoredText(xmp, path, options);
-      if (options.items) {
-        ForEachItem(xmp, path, options, [&](const Path& item, int index) {
-          ValueNode child;
-          const std::string itemName = name + "[" + std::to_string(index) + "]";
-          if (ReadValue(xmp, item, itemName, options, child)) {
-            child.label = "[" + std::to_string(index) + "]";
-            node.children.push_back(std::move(child));
-          }
-        });
-      }
+    if (elementType && !elementType->fields.empty()) {
+      readItems();
+      if (node.children.empty()) return false;
       out = std::move(node);
       return true;
     }
-      ForEachItem(xmp, path, options, [&](const Path& item, int index) {
-      ValueNode child;
-      const std::string itemName = name + "[" + std::to_string(index) + "]";
-      if (ReadValue(xmp, item, itemName, options, child)) {
-        child.label = "[" + std::to_string(index) + "]";
-        node.children.push_back(std::move(child));
-      }
-    });
-    if (node.children.empty()) return false;
+    // Read as a whole first: that is where an aggregate says "mixed".
+    UTF8String text;
+    GetValueResult result = ValueAbsent;
+    const bool found = GetValue(xmp, path, text, &result);
+    if (result == ValueMixed) {
+      node.mixed = true;
+      out = std::move(node);
+      return true;
+    }
+    if (!found) return false;
+    node.value = text;
+    if (options.raw) node.raw = ReadStoredText(xmp, path, options);
+    if (options.items) readItems();
     out = std::move(node);
     return true;
   }
