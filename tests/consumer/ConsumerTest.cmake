@@ -1,6 +1,5 @@
-# Installs the library into a staging folder, builds the consumer project
-# against it with find_package and runs it.
-set(OVRA_STAGE ${CMAKE_BINARY_DIR}/consumer-stage)
+# Installs the library into a temporary staging folder, builds the consumer
+# project against it with find_package and runs it.
 # A sanitized library needs a sanitized host program.
 set(OVRA_CONSUMER_FLAGS "")
 if(OVRA_SANITIZE)
@@ -9,7 +8,6 @@ endif()
 add_test(NAME Consumer.FindPackageAndRun
   COMMAND ${CMAKE_COMMAND}
     -DBUILD_DIR=${CMAKE_BINARY_DIR}
-    -DSTAGE=${OVRA_STAGE}
     -DSOURCE=${CMAKE_CURRENT_SOURCE_DIR}/consumer
     -DGENERATOR=${CMAKE_GENERATOR}
     "-DEXTRA_FLAGS=${OVRA_CONSUMER_FLAGS}"
