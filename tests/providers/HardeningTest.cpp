@@ -14,7 +14,6 @@
 #include <ovrametadata/MetadataUtils.h>
 
 #include "../xmp/HostileInputs.h"
-#include "../xmp/XMPMediaFiles.h"
 #include "MediaFiles.h"
 #include "ProviderTestSupport.h"
 
@@ -22,16 +21,8 @@ namespace {
 
 namespace fs = std::filesystem;
 using namespace ovrametadata;
+using ovratest::Edit;
 using ovratest::MediaKind;
-
-void Edit(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path, const std::string& value) {
-  MetaDataUpdateAccess access(provider);
-  if (SetValue(*access, path, UTF8String(value))) access.AddChange(path);
-}
-
-std::string JpegWith(const std::string& packet) {
-  return hostile::JpegWithSegments(xmptest::media::Jpeg(), {hostile::StandardXMPSegment(packet)});
-}
 
 // ---------------------------------------------------------------------------
 // Hostile input
@@ -59,8 +50,8 @@ TEST(HostileInput, FilesThatTheHandlersMustNotOpenHoldNullMetadataAndAreNeverWri
   } cases[] = {
       {"ext.jpg", 0x4A504547,
        hostile::JpegWithExtendedXMP(xmptest::media::Jpeg(), hostile::DeepResources(100000))},
-      {"garbage.jpg", 0x4A504547, JpegWith("<x:xmpmeta garbage \x01\x02")},
-      {"empty.jpg", 0x4A504547, JpegWith("")},
+      {"garbage.jpg", 0x4A504547, hostile::JpegWithPacket(xmptest::media::Jpeg(), "<x:xmpmeta garbage \x01\x02")},
+      {"empty.jpg", 0x4A504547, hostile::JpegWithPacket(xmptest::media::Jpeg(), "")},
       {"udta.mp4", 0x4D503420, hostile::Mp4WithNestedUdta(xmptest::media::Mp4(), 20000)},
       {"moov.mp4", 0x4D503420,
        hostile::WithBrokenBoxSize(xmptest::media::Mp4() + hostile::XMPBox(hostile::Packet("<dc:format>x</dc:format>")),

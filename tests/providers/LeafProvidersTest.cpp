@@ -21,21 +21,10 @@ namespace {
 namespace fs = std::filesystem;
 using namespace ovrametadata;
 using ovratest::CallCounter;
+using ovratest::Edit;
+using ovratest::WritingDisabledScope;
 using ovratest::MediaKind;
 using ovratest::RecordingBufferProvider;
-
-class WritingDisabledScope {
- public:
-  WritingDisabledScope() { DisableXMPWriting(true); }
-  ~WritingDisabledScope() { DisableXMPWriting(false); }
-};
-
-// Edits one text property through an update guard.
-void Edit(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path,
-          const std::string& value) {
-  MetaDataUpdateAccess access(provider);
-  if (SetValue(*access, path, UTF8String(value))) access.AddChange(path);
-}
 
 // ---------------------------------------------------------------------------
 // BufferProviderImpl

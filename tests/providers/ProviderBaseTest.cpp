@@ -14,6 +14,7 @@ namespace {
 
 using namespace ovrametadata;
 using ovratest::CallCounter;
+using ovratest::WritingDisabledScope;
 using ovratest::RecordingBufferProvider;
 
 const std::string kTitled = "<pt:Title>first</pt:Title>";
@@ -30,12 +31,6 @@ std::string LastChangedParts(const std::string& bytes) {
                       &changed);
   return changed;
 }
-
-class WritingDisabledScope {
- public:
-  WritingDisabledScope() { DisableXMPWriting(true); }
-  ~WritingDisabledScope() { DisableXMPWriting(false); }
-};
 
 // A provider that claims to write its own change list.
 class SelfRecordingProvider : public RecordingBufferProvider {

@@ -142,6 +142,12 @@ void RecordingBufferProvider::WriteBuffer(const std::vector<Path>& changes, cons
   writes.push_back(Write{changes, std::string(data, length)});
 }
 
+void Edit(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path,
+          const std::string& value) {
+  MetaDataUpdateAccess access(provider);
+  if (SetValue(*access, path, UTF8String(value))) access.AddChange(path);
+}
+
 CallCounter::CallCounter()
     : calls(std::make_shared<int>(0)), handles(std::make_shared<std::vector<XMPMetaRef>>()) {
   auto count = calls;

@@ -80,6 +80,16 @@ class RecordingBufferProvider : public ovrametadata::BufferProviderImpl {
   std::function<void()> duringWrite;
 };
 
+class WritingDisabledScope {
+ public:
+  WritingDisabledScope() { ovrametadata::DisableXMPWriting(true); }
+  ~WritingDisabledScope() { ovrametadata::DisableXMPWriting(false); }
+};
+
+// Sets one text property through an update guard.
+void Edit(const boost::shared_ptr<ovrametadata::MetaDataProvider>& provider,
+          const ovrametadata::Path& path, const std::string& value);
+
 // A shared callback that counts its calls and keeps the handles it got.
 struct CallCounter {
   CallCounter();

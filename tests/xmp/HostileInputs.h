@@ -117,6 +117,10 @@ inline std::string StandardXMPSegment(const std::string& packet) {
   return std::string("http://ns.adobe.com/xap/1.0/", 29) + packet;
 }
 
+inline std::string JpegWithPacket(const std::string& jpeg, const std::string& packet) {
+  return JpegWithSegments(jpeg, {StandardXMPSegment(packet)});
+}
+
 // A JPEG whose standard XMP points at Extended XMP that carries `extended`,
 // split into segments as writers do.
 inline std::string JpegWithExtendedXMP(const std::string& jpeg, const std::string& extended) {

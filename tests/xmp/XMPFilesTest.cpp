@@ -1,9 +1,5 @@
 // Reading and writing the XMP of small media files and of .xmp sidecars,
 // and the interoperability with an independent reader and writer.
-#include <array>
-#include <cstdio>
-#include <cstdlib>
-#include <memory>
 #include <string>
 #include <vector>
 
@@ -55,20 +51,6 @@ void WriteSample(const std::string& path) {
   file.PutXMP(meta);
   file.CloseFile();
 }
-
-std::string Shell(const std::string& command) {
-  std::string out;
-  std::unique_ptr<FILE, int (*)(FILE*)> pipe(popen(command.c_str(), "r"), pclose);
-  if (!pipe) return out;
-  std::array<char, 512> buffer;
-  while (fgets(buffer.data(), buffer.size(), pipe.get())) out += buffer.data();
-  return out;
-}
-
-// The test main sets a locale that may not be installed; perl would warn.
-const char kExifTool[] = "LC_ALL=C LANG=C exiftool";
-
-bool HaveExifTool() { return std::system((std::string(kExifTool) + " -ver > /dev/null 2>&1").c_str()) == 0; }
 
 }  // namespace
 
@@ -180,12 +162,7 @@ TEST(XMPFiles, SidecarWorksLikeAMediaFile) {
   EXPECT_EQ(Get(back, kXMP_NS_DC, "creator[1]"), "Ana Müller");
   EXPECT_EQ(ovratest::ReadFile(sidecar).find("MultiFileCount"), std::string::npos);
   // The sidecar keeps its own name; no temporary file is left behind.
-  int entries = 0;
-  for (const auto& entry : std::filesystem::directory_iterator(dir.path())) {
-    (void)entry;
-    ++entries;
-  }
-  EXPECT_EQ(entries, 2);
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir.path()), std::filesystem::directory_iterator()), 2);
   ovratest::WriteFile(sidecar, "  \n");
   XMPFiles empty(sidecar, kXMP_UnknownFile, kRead);
   XMPMeta none;
@@ -199,17 +176,17 @@ TEST(XMPFiles, VersionTextsComeFromTheToolkit) {
 }
 
 TEST(XMPFilesInterop, ExifToolReadsWhatTheLayerWritesAndTheReverse) {
-  if (!HaveExifTool()) GTEST_SKIP() << "exiftool is not installed; interoperability not checked";
+  if (!xmptest::media::HaveExifTool()) GTEST_SKIP() << "exiftool is not installed; interoperability not checked";
   ovratest::TempDir dir;
   const std::string jpeg = (dir / "ours.jpg").string();
   ovratest::WriteFile(jpeg, xmptest::media::Jpeg());
   WriteSample(jpeg);
-  const std::string seen = Shell(std::string(kExifTool) + " -s -s -s -XMP-dc:Title -XMP-dc:Subject -XMP-xmp:Rating '" + jpeg + "'");
+  const std::string seen = xmptest::media::RunCommand("LC_ALL=C exiftool -s -s -s -XMP-dc:Title -XMP-dc:Subject -XMP-xmp:Rating '" + jpeg + "'");
   EXPECT_EQ(seen, "Tiny sample\nalpha, beta; gamma\n3\n");
 
   const std::string png = (dir / "theirs.png").string();
   ovratest::WriteFile(png, xmptest::media::Png());
-  const std::string written = Shell(std::string(kExifTool) + " -q -overwrite_original -XMP-dc:Creator='Zoë Writer' "
+  const std::string written = xmptest::media::RunCommand("LC_ALL=C exiftool -q -overwrite_original -XMP-dc:Creator='Zoë Writer' "
                                     "-XMP-dc:Creator='Second' -XMP-xmp:Label=Approved '" + png + "' 2>&1");
   EXPECT_EQ(written, "");
   const XMPMeta back = ReadBack(png);

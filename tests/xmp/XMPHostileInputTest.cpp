@@ -146,9 +146,7 @@ std::string Jpeg() { return xmptest::media::Jpeg(); }
 std::string Mp4() { return xmptest::media::Mp4(); }
 std::string Wav() { return xmptest::media::Wav(); }
 
-std::string JpegWith(const std::string& packet) {
-  return hostile::JpegWithSegments(Jpeg(), {hostile::StandardXMPSegment(packet)});
-}
+std::string JpegWith(const std::string& packet) { return hostile::JpegWithPacket(Jpeg(), packet); }
 
 const FileCase kHostileFiles[] = {
     {"JPEG, XMP nested 1,500 levels", "deep.jpg", kXMP_JPEGFile, [] { return JpegWith(hostile::DeepResources(1500)); }},

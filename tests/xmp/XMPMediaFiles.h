@@ -1,8 +1,12 @@
-// Byte builders for the smallest media files that the file handlers accept:
-// one pixel, one sample, one frame. No XMP inside.
+// Byte builders for the smallest media files that the file handlers accept
+// (one pixel, one sample, one frame; no XMP inside), and ExifTool as an
+// independent reader and writer.
 #pragma once
 
 #include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
 #include <string>
 
 namespace xmptest {
@@ -145,6 +149,32 @@ inline std::string Mp3() {
   std::string frame("\xFF\xFB\x90\x64", 4);
   frame += std::string(413, '\0');
   return frame + frame + frame;
+}
+
+// The test main sets a locale that may not be installed; perl would warn.
+inline bool HaveExifTool() {
+  static const bool have = std::system("LC_ALL=C exiftool -ver >/dev/null 2>&1") == 0;
+  return have;
+}
+
+// Runs a shell command and returns its standard output.
+inline std::string RunCommand(const std::string& command) {
+  std::string output;
+  if (FILE* pipe = ::popen(command.c_str(), "r")) {
+    char buffer[4096];
+    std::size_t n;
+    while ((n = std::fread(buffer, 1, sizeof buffer, pipe)) > 0) output.append(buffer, n);
+    ::pclose(pipe);
+  }
+  return output;
+}
+
+// The value of one tag as ExifTool prints it (e.g. "XMP-xmp:Label"),
+// without the final newline; empty when the tag is absent.
+inline std::string ExifToolValue(const std::filesystem::path& file, const std::string& tag) {
+  std::string out = RunCommand("LC_ALL=C exiftool -s3 -" + tag + " '" + file.string() + "' 2>/dev/null");
+  while (!out.empty() && (out.back() == '\n' || out.back() == '\r')) out.pop_back();
+  return out;
 }
 
 }  // namespace media
