@@ -91,41 +91,33 @@ TEST(DeleteValue, AnArrayItemIsEmptiedSoThatIndicesStay) {
   EXPECT_FALSE(DeleteValue(meta.GetInternalRef(), second));
 }
 
-TEST(DeleteValue, TheOnlyFieldTakesItsStructureAlong) {
-  ovraxmp::XMPMeta meta =
+TEST(DeleteValue, StructuresLeftEmptyAreRemovedUpToTheFirstWithAValue) {
+  const Path spot = ovratest::TestPath("Spot");
+  const Path spotX = ovratest::FieldPath(spot, "PTPoint", "X");
+  ovraxmp::XMPMeta onlyField =
       ovratest::Packet("<pt:Spot rdf:parseType=\"Resource\"><pt:X>1</pt:X></pt:Spot>");
-  const Path spot = ovratest::TestPath("Spot");
-  EXPECT_TRUE(DeleteValue(meta.GetInternalRef(), ovratest::FieldPath(spot, "PTPoint", "X")));
-  EXPECT_FALSE(HasValue(meta.GetInternalRef(), spot));
-}
+  EXPECT_TRUE(DeleteValue(onlyField.GetInternalRef(), spotX));
+  EXPECT_FALSE(HasValue(onlyField.GetInternalRef(), spot));
 
-TEST(DeleteValue, OneOfTwoFieldsLeavesTheOther) {
-  ovraxmp::XMPMeta meta = ovratest::Packet(
+  ovraxmp::XMPMeta twoFields = ovratest::Packet(
       "<pt:Spot rdf:parseType=\"Resource\"><pt:X>1</pt:X><pt:Y>2</pt:Y></pt:Spot>");
-  const Path spot = ovratest::TestPath("Spot");
-  EXPECT_TRUE(DeleteValue(meta.GetInternalRef(), ovratest::FieldPath(spot, "PTPoint", "X")));
-  EXPECT_FALSE(HasValue(meta.GetInternalRef(), ovratest::FieldPath(spot, "PTPoint", "X")));
-  EXPECT_EQ(ovratest::Text(meta.GetInternalRef(), ovratest::FieldPath(spot, "PTPoint", "Y")), "2");
-}
+  EXPECT_TRUE(DeleteValue(twoFields.GetInternalRef(), spotX));
+  EXPECT_FALSE(HasValue(twoFields.GetInternalRef(), spotX));
+  EXPECT_EQ(ovratest::Text(twoFields.GetInternalRef(), ovratest::FieldPath(spot, "PTPoint", "Y")), "2");
 
-TEST(DeleteValue, EmptiedNestedStructuresAreRemovedUpToTheFirstWithAValue) {
-  const std::string inner =
-      "<pt:Inner rdf:parseType=\"Resource\"><pt:X>1</pt:X></pt:Inner>";
+  const std::string inner = "<pt:Inner rdf:parseType=\"Resource\"><pt:X>1</pt:X></pt:Inner>";
   const Path outer = ovratest::TestPath("Outer");
   const Path x = ovratest::FieldPath(ovratest::FieldPath(outer, "PTOuter", "Inner"), "PTPoint", "X");
   ASSERT_FALSE(x.description.empty());
-
   ovraxmp::XMPMeta alone =
       ovratest::Packet("<pt:Outer rdf:parseType=\"Resource\">" + inner + "</pt:Outer>");
   EXPECT_TRUE(DeleteValue(alone.GetInternalRef(), x));
   EXPECT_FALSE(HasValue(alone.GetInternalRef(), outer));
-
   ovraxmp::XMPMeta tagged = ovratest::Packet("<pt:Outer rdf:parseType=\"Resource\">" + inner +
                                              "<pt:Tag>kept</pt:Tag></pt:Outer>");
   EXPECT_TRUE(DeleteValue(tagged.GetInternalRef(), x));
   EXPECT_FALSE(HasValue(tagged.GetInternalRef(), ovratest::FieldPath(outer, "PTOuter", "Inner")));
-  EXPECT_EQ(ovratest::Text(tagged.GetInternalRef(), ovratest::FieldPath(outer, "PTOuter", "Tag")),
-            "kept");
+  EXPECT_EQ(ovratest::Text(tagged.GetInternalRef(), ovratest::FieldPath(outer, "PTOuter", "Tag")), "kept");
 }
 
 TEST(DeleteValue, OrdinaryPacketsGetNoDeletionRecord) {
@@ -235,42 +227,39 @@ TEST(ArrayItems, DeleteRemovesOneItemAndTheLastTakesThePropertyAlong) {
 // ---------------------------------------------------------------------------
 // Templates
 
-class Templates : public ::testing::Test {
- protected:
-  ovraxmp::XMPMeta destination =
-      ovratest::Packet("<pt:Title>mine</pt:Title><pt:Note>my note</pt:Note>");
-  XMPMetaRef Dest() { return destination.GetInternalRef(); }
-};
-
-TEST_F(Templates, ReplaceAllClearsUnnamedAndReplacesExisting) {
-  ovraxmp::XMPMeta tmpl = ovratest::Packet("<pt:Title>template</pt:Title><pt:Count>3</pt:Count>");
-  EXPECT_TRUE(ApplyTemplate(Dest(), tmpl.GetInternalRef(), TemplateReplaceAll));
-  EXPECT_EQ(ovratest::Raw(Dest(), ovratest::kTestNS, "Title"), "template");
-  EXPECT_EQ(ovratest::Raw(Dest(), ovratest::kTestNS, "Note"), "<absent>");
-  EXPECT_EQ(ovratest::Raw(Dest(), ovratest::kTestNS, "Count"), "<absent>");
-}
-
-TEST_F(Templates, ClearUnnamedKeepsTheValuesOfNamedProperties) {
-  ovraxmp::XMPMeta tmpl = ovratest::Packet("<pt:Title>template</pt:Title>");
-  EXPECT_TRUE(ApplyTemplate(Dest(), tmpl.GetInternalRef(), TemplateClearUnnamed));
-  EXPECT_EQ(ovratest::Raw(Dest(), ovratest::kTestNS, "Title"), "mine");
-  EXPECT_EQ(ovratest::Raw(Dest(), ovratest::kTestNS, "Note"), "<absent>");
-}
-
-TEST_F(Templates, ReplaceDeleteEmptyDeletesWhatTheTemplateEmpties) {
-  ovraxmp::XMPMeta tmpl = ovratest::Packet("<pt:Title></pt:Title><pt:Note>new note</pt:Note>");
-  EXPECT_TRUE(ApplyTemplate(Dest(), tmpl.GetInternalRef(), TemplateReplaceDeleteEmpty));
-  EXPECT_EQ(ovratest::Raw(Dest(), ovratest::kTestNS, "Title"), "<absent>");
-  EXPECT_EQ(ovratest::Raw(Dest(), ovratest::kTestNS, "Note"), "new note");
-}
-
-TEST_F(Templates, UnknownOptionsApplyNoFlagsAndNullPacketsAreRefused) {
-  ovraxmp::XMPMeta tmpl = ovratest::Packet("<pt:Title>template</pt:Title>");
-  const std::string before = ovratest::Serialize(Dest());
-  EXPECT_TRUE(ApplyTemplate(Dest(), tmpl.GetInternalRef(), static_cast<TemplateImportOptions>(3)));
-  EXPECT_EQ(ovratest::Serialize(Dest()), before);
-  EXPECT_FALSE(ApplyTemplate(nullptr, tmpl.GetInternalRef(), TemplateReplaceAll));
-  EXPECT_FALSE(ApplyTemplate(Dest(), nullptr, TemplateReplaceAll));
+TEST(Templates, EachOptionDoesItsPart) {
+  const struct {
+    TemplateImportOptions option;
+    const char* tmpl;
+    const char* title;  // expected afterwards, from "mine"
+    const char* note;   // expected afterwards, from "my note"
+    const char* count;  // expected afterwards, absent before
+  } cases[] = {
+      {TemplateReplaceAll, "<pt:Title>template</pt:Title><pt:Count>3</pt:Count>", "template", "<absent>",
+       "<absent>"},
+      {TemplateClearUnnamed, "<pt:Title>template</pt:Title>", "mine", "<absent>", "<absent>"},
+      {TemplateReplaceDeleteEmpty, "<pt:Title></pt:Title><pt:Note>new note</pt:Note>", "<absent>", "new note",
+       "<absent>"},
+      // Unknown bits apply no flag at all.
+      {static_cast<TemplateImportOptions>(3), "<pt:Title>template</pt:Title><pt:Count>3</pt:Count>", "mine",
+       "my note", "<absent>"},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.tmpl);
+    ovraxmp::XMPMeta dest = ovratest::Packet("<pt:Title>mine</pt:Title><pt:Note>my note</pt:Note>");
+    ovraxmp::XMPMeta tmpl = ovratest::Packet(c.tmpl);
+    const std::string before = ovratest::Serialize(dest.GetInternalRef());
+    EXPECT_TRUE(ApplyTemplate(dest.GetInternalRef(), tmpl.GetInternalRef(), c.option));
+    EXPECT_EQ(ovratest::Raw(dest.GetInternalRef(), ovratest::kTestNS, "Title"), c.title);
+    EXPECT_EQ(ovratest::Raw(dest.GetInternalRef(), ovratest::kTestNS, "Note"), c.note);
+    EXPECT_EQ(ovratest::Raw(dest.GetInternalRef(), ovratest::kTestNS, "Count"), c.count);
+    if (c.option == static_cast<TemplateImportOptions>(3)) {
+      EXPECT_EQ(ovratest::Serialize(dest.GetInternalRef()), before);
+    }
+  }
+  ovraxmp::XMPMeta some = ovratest::Packet("<pt:Title>t</pt:Title>");
+  EXPECT_FALSE(ApplyTemplate(nullptr, some.GetInternalRef(), TemplateReplaceAll));
+  EXPECT_FALSE(ApplyTemplate(some.GetInternalRef(), nullptr, TemplateReplaceAll));
 }
 
 // ---------------------------------------------------------------------------
