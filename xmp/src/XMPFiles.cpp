@@ -5,10 +5,12 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <memory>
 #include <sstream>
 #include <utility>
 
@@ -58,14 +60,18 @@ std::string CopyBeside(const std::string& target) {
   struct stat info {};
   if (in >= 0 && ::fstat(in, &info) == 0) {
     ok = ::fchmod(out, info.st_mode & 07777) == 0;
-    std::vector<char> buffer(1 << 20);
-    for (ssize_t got; ok && (got = ::read(in, buffer.data(), buffer.size())) != 0;) {
+    // Sized to the file (at most 1 MiB) and left uninitialised: filling it
+    // cost more than the copy itself for small files.
+    const std::size_t size = static_cast<std::size_t>(
+        std::clamp<off_t>(info.st_size, off_t(4096), off_t(1) << 20));
+    const std::unique_ptr<char[]> buffer(new char[size]);
+    for (ssize_t got; ok && (got = ::read(in, buffer.get(), size)) != 0;) {
       if (got < 0) {
         ok = errno == EINTR;
         continue;
       }
       for (ssize_t done = 0; ok && done < got;) {
-        const ssize_t put = ::write(out, buffer.data() + done, static_cast<std::size_t>(got - done));
+        const ssize_t put = ::write(out, buffer.get() + done, static_cast<std::size_t>(got - done));
         if (put < 0) {
           ok = errno == EINTR;
         } else {
