@@ -41,15 +41,18 @@ XMPIterator::~XMPIterator() {
 bool XMPIterator::Next(std::string* schemaNS, std::string* propPath, std::string* propValue,
                        XMP_OptionBits* options) {
   if (!mIter) return false;
-  detail::XmpString ns, path, value;
+  // The toolkit's strings are kept from step to step (a whole packet is
+  // walked one node at a time), and only the parts asked for are fetched.
+  thread_local detail::XmpString ns, path, value;
   std::uint32_t bits = 0;
-  if (!xmp_iterator_next(static_cast<XmpIteratorPtr>(mIter), ns, path, value, &bits)) {
+  if (!xmp_iterator_next(static_cast<XmpIteratorPtr>(mIter), schemaNS ? ns.get() : nullptr,
+                         propPath ? path.get() : nullptr, propValue ? value.get() : nullptr, &bits)) {
     if (xmp_get_error() != 0) detail::ThrowLastError(kXMPErr_InternalFailure, "iterating");
     return false;
   }
-  if (schemaNS) *schemaNS = ns.str();
-  if (propPath) *propPath = path.str();
-  if (propValue) *propValue = value.str();
+  if (schemaNS) schemaNS->assign(xmp_string_cstr(ns), xmp_string_len(ns));
+  if (propPath) propPath->assign(xmp_string_cstr(path), xmp_string_len(path));
+  if (propValue) propValue->assign(xmp_string_cstr(value), xmp_string_len(value));
   if (options) *options = bits;
   return true;
 }
