@@ -16,14 +16,7 @@ namespace {
 using namespace ovrametadata;
 using ovratest::CallCounter;
 using ovratest::RecordingBufferProvider;
-
-// What a written packet holds for one simple property.
-std::string WrittenRaw(const RecordingBufferProvider::Write& write, const std::string& ns,
-                       const std::string& name) {
-  ovraxmp::XMPMeta meta;
-  meta.ParseFromBuffer(write.bytes);
-  return ovratest::Raw(meta.GetInternalRef(), ns, name);
-}
+using ovratest::WrittenRaw;
 
 class DisjointProxy : public ::testing::Test {
  protected:

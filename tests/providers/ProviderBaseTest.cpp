@@ -92,14 +92,8 @@ TEST(UpdateGuard, WritesTheChangedPathsInOrderWithDuplicates) {
   EXPECT_EQ(changes[0].description, "Title");
   EXPECT_EQ(changes[1].description, "Note");
   EXPECT_EQ(changes[2].description, "Title");
-  // The written bytes are the edited packet.
-  const ovraxmp::XMPMeta written = [&] {
-    ovraxmp::XMPMeta m;
-    m.ParseFromBuffer(provider->writes[0].bytes);
-    return m;
-  }();
-  EXPECT_EQ(ovratest::Raw(written.GetInternalRef(), ovratest::kTestNS, "Title"), "second");
-  EXPECT_EQ(ovratest::Raw(written.GetInternalRef(), ovratest::kTestNS, "Note"), "a note");
+  EXPECT_EQ(ovratest::WrittenRaw(provider->writes[0], ovratest::kTestNS, "Title"), "second");
+  EXPECT_EQ(ovratest::WrittenRaw(provider->writes[0], ovratest::kTestNS, "Note"), "a note");
 }
 
 TEST(UpdateGuard, RecordsOneHistoryPartPerChangedPath) {

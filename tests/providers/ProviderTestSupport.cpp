@@ -148,6 +148,13 @@ void Edit(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path,
   if (SetValue(*access, path, UTF8String(value))) access.AddChange(path);
 }
 
+std::string WrittenRaw(const RecordingBufferProvider::Write& write, const std::string& ns,
+                       const std::string& name) {
+  ovraxmp::XMPMeta meta;
+  meta.ParseFromBuffer(write.bytes);
+  return Raw(meta.GetInternalRef(), ns, name);
+}
+
 CallCounter::CallCounter()
     : calls(std::make_shared<int>(0)), handles(std::make_shared<std::vector<XMPMetaRef>>()) {
   auto count = calls;

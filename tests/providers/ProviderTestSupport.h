@@ -90,6 +90,10 @@ class WritingDisabledScope {
 void Edit(const boost::shared_ptr<ovrametadata::MetaDataProvider>& provider,
           const ovrametadata::Path& path, const std::string& value);
 
+// What a recorded write-back holds for one simple property (see Raw).
+std::string WrittenRaw(const RecordingBufferProvider::Write& write, const std::string& ns,
+                       const std::string& name);
+
 // A shared callback that counts its calls and keeps the handles it got.
 struct CallCounter {
   CallCounter();

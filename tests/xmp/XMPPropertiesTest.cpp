@@ -223,12 +223,6 @@ TEST_F(XMPProperties, StructureItemsCanBeInsertedAnywhere) {
   EXPECT_THROW(meta.SetArrayItem(kTestNS, "People", 1, "text", kXMP_PropValueIsStruct), XMP_Error);
 }
 
-TEST_F(XMPProperties, LargeArrayCountIsExact) {
-  XMPMeta meta;
-  for (int i = 0; i < 37; ++i) meta.AppendArrayItem(kTestNS, "Bag", kXMP_PropValueIsArray, std::to_string(i));
-  EXPECT_EQ(meta.CountArrayItems(kTestNS, "Bag"), 37);
-}
-
 TEST_F(XMPProperties, StructFieldsAndQualifiers) {
   XMPMeta meta;
   meta.SetStructField(kTestNS, "Place", kXMP_NS_DC, "title", "Harbour");

@@ -21,8 +21,10 @@ TEST(XMPStartup, InitializeIsCountedAndTerminateOfExtraHoldsKeepsToolkitUp) {
   EXPECT_NE(meta.GetInternalRef(), nullptr);
 }
 
-TEST(XMPStartup, VersionTextNamesTheCoreAndClientNameIsKept) {
+TEST(XMPStartup, VersionTextsNameTheCoreAndTheFilesLayerAndClientNameIsKept) {
   EXPECT_NE(XMPMeta::GetVersionInfo().find("XMP Core"), std::string::npos);
+  EXPECT_NE(XMPFiles::GetVersionInfo().find("Exempi"), std::string::npos);
+  EXPECT_NE(XMPFiles::GetVersionInfo().find(XMPMeta::GetVersionInfo()), std::string::npos);
   EXPECT_EQ(XMPMeta::GetClientName(), "ovraxmp tests");
 }
 
