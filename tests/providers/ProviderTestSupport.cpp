@@ -1,10 +1,7 @@
 #include "ProviderTestSupport.h"
 
-#include <fcntl.h>
 #include <linux/capability.h>
 #include <sys/syscall.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include <stdexcept>
 
@@ -12,6 +9,7 @@
 
 #include <ovrametadata/Definitions.h>
 
+#include "../xmp/HostileInputs.h"
 #include "MediaFiles.h"
 
 namespace ovratest {
@@ -207,22 +205,18 @@ boost::shared_ptr<FileProvider> OpenFile(const fs::path& path) {
 }
 
 int RunWithoutPermissionOverride(const std::function<int()>& fn) {
-  const pid_t child = ::fork();
-  if (child < 0) return 77;
-  if (child == 0) {
+  const hostile::ChildResult run = hostile::RunIsolated([&] {
     __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
     __user_cap_data_struct data[2] = {};
-    if (::syscall(SYS_capget, &header, data) != 0) ::_exit(77);
+    if (::syscall(SYS_capget, &header, data) != 0) return 77;
     for (int cap : {CAP_DAC_OVERRIDE, CAP_DAC_READ_SEARCH, CAP_FOWNER}) {
       data[cap / 32].effective &= ~(1u << (cap % 32));
       data[cap / 32].permitted &= ~(1u << (cap % 32));
     }
-    if (::syscall(SYS_capset, &header, data) != 0) ::_exit(77);
-    ::_exit(fn());
-  }
-  int status = 0;
-  if (::waitpid(child, &status, 0) != child || !WIFEXITED(status)) return 78;
-  return WEXITSTATUS(status);
+    if (::syscall(SYS_capset, &header, data) != 0) return 77;
+    return fn();
+  });
+  return run.exited ? run.code : 78;
 }
 
 }  // namespace ovratest
