@@ -310,11 +310,17 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj, std::string* rawPacket) {
     // The handler drops what it cannot parse and hands over the rest (or an
     // empty packet), which a write would then store over the original: a
     // stored packet that does not parse means the file has no readable XMP.
+    // A packet of the plain shapes writers produce always parses; only
+    // others are parsed a second time to find out.
     detail::XmpString raw;
     if (xmp_files_get_xmp_xmpstring(file, raw, nullptr) && xmp_string_len(raw) > 0) {
       try {
-        XMPMeta probe;
-        probe.ParseFromBuffer(xmp_string_cstr(raw), xmp_string_len(raw));
+        if (detail::PacketIsPlainRDF(xmp_string_cstr(raw), xmp_string_len(raw))) {
+          detail::RequireSanePacket(xmp_string_cstr(raw), xmp_string_len(raw));
+        } else {
+          XMPMeta probe;
+          probe.ParseFromBuffer(xmp_string_cstr(raw), xmp_string_len(raw));
+        }
       } catch (const XMP_Error&) {
         xmp_free(fresh);
         return false;

@@ -9,6 +9,7 @@
 #include <cstring>
 #include <limits>
 #include <map>
+#include <optional>
 #include <string_view>
 #include <vector>
 
@@ -712,6 +713,361 @@ bool MediaFileIsSane(const std::string& utf8Path, std::string* problem) {
   if (!sane && problem) *problem = verdict.problem;
   return sane;
 }
+
+// ---------------------------------------------------------------------------
+// Plain packets
+
+namespace {
+
+constexpr std::string_view kRdfURI = "http://www.w3.org/1999/02/22-rdf-syntax-ns#";
+
+bool NameStart(char c) { return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_'; }
+bool NameChar(char c) { return NameStart(c) || (c >= '0' && c <= '9') || c == '-' || c == '.'; }
+
+// An ASCII XML name with exactly one colon, split into prefix and local part.
+bool SplitQName(std::string_view name, std::string_view* prefix, std::string_view* local) {
+  const std::size_t colon = name.find(':');
+  if (colon == std::string_view::npos || colon == 0 || colon + 1 >= name.size()) return false;
+  *prefix = name.substr(0, colon);
+  *local = name.substr(colon + 1);
+  for (std::string_view part : {*prefix, *local}) {
+    if (!NameStart(part[0])) return false;
+    for (char c : part)
+      if (!NameChar(c)) return false;
+  }
+  return true;
+}
+
+// Character data with only the predefined entities and references to
+// characters XML allows.
+bool PlainText(std::string_view text, bool attribute) {
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const auto c = static_cast<unsigned char>(text[i]);
+    if (c < 0x20 && c != '\t' && c != '\n' && c != '\r') return false;
+    if (c == '<' || (attribute && c == '>')) return false;
+    if (c == 0xEF && i + 2 < text.size() && static_cast<unsigned char>(text[i + 1]) == 0xBF &&
+        static_cast<unsigned char>(text[i + 2]) >= 0xBE)
+      return false;  // U+FFFE, U+FFFF
+    if (c != '&') continue;
+    const std::size_t semi = text.find(';', i);
+    if (semi == std::string_view::npos) return false;
+    const std::string_view entity = text.substr(i + 1, semi - i - 1);
+    if (entity == "amp" || entity == "lt" || entity == "gt" || entity == "quot" || entity == "apos") {
+      i = semi;
+      continue;
+    }
+    if (entity.size() < 2 || entity[0] != '#' || entity.size() > 9) return false;
+    const bool hex = entity[1] == 'x';
+    const std::string_view digits = entity.substr(hex ? 2 : 1);
+    if (digits.empty()) return false;
+    std::uint32_t code = 0;
+    for (char d : digits) {
+      std::uint32_t v;
+      if (d >= '0' && d <= '9') {
+        v = static_cast<std::uint32_t>(d - '0');
+      } else if (hex && d >= 'a' && d <= 'f') {
+        v = static_cast<std::uint32_t>(d - 'a' + 10);
+      } else if (hex && d >= 'A' && d <= 'F') {
+        v = static_cast<std::uint32_t>(d - 'A' + 10);
+      } else {
+        return false;
+      }
+      code = code * (hex ? 16 : 10) + v;
+    }
+    const bool allowed = code == 0x9 || code == 0xA || code == 0xD || (code >= 0x20 && code <= 0xD7FF) ||
+                         (code >= 0xE000 && code <= 0xFFFD) || (code >= 0x10000 && code <= 0x10FFFF);
+    if (!allowed) return false;
+    i = semi;
+  }
+  return true;
+}
+
+bool IsBlankText(std::string_view text) {
+  return text.find_first_not_of(" \t\r\n") == std::string_view::npos;
+}
+
+// Names the toolkit treats as aliases of other properties: an alias beside
+// its actual property may be dropped.
+bool MaybeAlias(std::string_view uri, std::string_view local) {
+  struct Alias {
+    std::string_view uri;
+    std::string_view local;  // empty: the whole namespace
+  };
+  static const Alias kAliases[] = {
+      {"http://ns.adobe.com/pdf/1.3/", ""},
+      {"http://ns.adobe.com/png/1.0/", ""},
+      {"http://ns.adobe.com/xap/1.0/", "Author"},
+      {"http://ns.adobe.com/xap/1.0/", "Authors"},
+      {"http://ns.adobe.com/xap/1.0/", "Description"},
+      {"http://ns.adobe.com/xap/1.0/", "Format"},
+      {"http://ns.adobe.com/xap/1.0/", "Keywords"},
+      {"http://ns.adobe.com/xap/1.0/", "Locale"},
+      {"http://ns.adobe.com/xap/1.0/", "Title"},
+      {"http://ns.adobe.com/xap/1.0/rights/", "Copyright"},
+      {"http://ns.adobe.com/photoshop/1.0/", "Author"},
+      {"http://ns.adobe.com/photoshop/1.0/", "Caption"},
+      {"http://ns.adobe.com/photoshop/1.0/", "Copyright"},
+      {"http://ns.adobe.com/photoshop/1.0/", "Keywords"},
+      {"http://ns.adobe.com/photoshop/1.0/", "Title"},
+      {"http://ns.adobe.com/tiff/1.0/", "Artist"},
+      {"http://ns.adobe.com/tiff/1.0/", "Copyright"},
+      {"http://ns.adobe.com/tiff/1.0/", "DateTime"},
+      {"http://ns.adobe.com/tiff/1.0/", "ImageDescription"},
+      {"http://ns.adobe.com/tiff/1.0/", "Software"},
+  };
+  for (const Alias& alias : kAliases)
+    if (alias.uri == uri && (alias.local.empty() || alias.local == local)) return true;
+  return false;
+}
+
+class PlainChecker {
+ public:
+  bool Run(std::string_view all) {
+    mAll = all;
+    std::size_t i = 0;
+    while (i < all.size()) {
+      const std::size_t lt = all.find('<', i);
+      const std::string_view text = all.substr(i, (lt == std::string_view::npos ? all.size() : lt) - i);
+      if (!Text(text)) return false;
+      if (lt == std::string_view::npos) break;
+      if (lt + 1 >= all.size()) return false;
+      const char c = all[lt + 1];
+      if (c == '?') {
+        // Processing instructions only around the root: the packet wrapper.
+        const std::size_t end = all.find("?>", lt);
+        if (end == std::string_view::npos || !mFrames.empty()) return false;
+        const bool wrapper = all.compare(lt + 2, 8, "xpacket ") == 0 || all.compare(lt + 2, 9, "xpacket?>") == 0;
+        if (!wrapper && !(lt == 0 && all.compare(2, 4, "xml ") == 0)) return false;
+        i = end + 2;
+      } else if (c == '!') {
+        return false;  // comments, CDATA, DOCTYPE
+      } else if (c == '/') {
+        const std::size_t gt = all.find('>', lt);
+        if (gt == std::string_view::npos || mFrames.empty()) return false;
+        std::string_view name = all.substr(lt + 2, gt - lt - 2);
+        while (!name.empty() && (name.back() == ' ' || name.back() == '\t' || name.back() == '\r' ||
+                                 name.back() == '\n'))
+          name.remove_suffix(1);
+        if (name != mFrames.back().name || !End()) return false;
+        i = gt + 1;
+      } else {
+        std::size_t next = 0;
+        if (!Start(lt, &next)) return false;
+        i = next;
+      }
+    }
+    return mFrames.empty() && mSawRDF;
+  }
+
+ private:
+  enum class Kind { kRoot, kRDF, kTopDescription, kDescription, kProperty, kItem, kContainer, kResource };
+  struct Frame {
+    std::string_view name;
+    Kind kind;
+    std::size_t scope;                   // mScope size before this element's declarations
+    std::vector<std::string_view> seen;  // property names, for duplicates
+    int children = 0;
+    bool text = false;
+    bool lang = false;
+  };
+
+  std::string_view Resolve(std::string_view prefix) const {
+    for (auto it = mScope.rbegin(); it != mScope.rend(); ++it)
+      if (it->first == prefix) return it->second;
+    return std::string_view();
+  }
+
+  bool Declare(std::string_view prefix, std::string_view uri) {
+    if (uri.empty() || prefix.empty() || prefix == "xml" || prefix == "xmlns" || !NameStart(prefix[0])) return false;
+    for (char c : prefix)
+      if (!NameChar(c)) return false;
+    // One URI per prefix and one prefix per URI, so that names compare as text.
+    for (const auto& [p, u] : mBindings)
+      if ((p == prefix) != (u == uri)) return false;
+    mBindings.emplace_back(prefix, uri);
+    mScope.emplace_back(prefix, uri);
+    return true;
+  }
+
+  bool Text(std::string_view text) {
+    if (text.empty()) return true;
+    if (!PlainText(text, false)) return false;
+    if (IsBlankText(text)) return true;
+    if (mFrames.empty()) return false;
+    Frame& frame = mFrames.back();
+    if (frame.kind != Kind::kProperty && frame.kind != Kind::kItem) return false;
+    frame.text = true;
+    return frame.children == 0;
+  }
+
+  // A name of a property in node: bound, not an rdf: or xml: term, unique.
+  bool Property(Frame* node, std::string_view qname, bool topLevel) {
+    std::string_view prefix, local;
+    if (!SplitQName(qname, &prefix, &local) || prefix == "xml") return false;
+    const std::string_view uri = Resolve(prefix);
+    if (uri.empty() || uri == kRdfURI) return false;
+    if (topLevel && MaybeAlias(uri, local)) return false;
+    std::vector<std::string_view>& seen = topLevel ? mTopLevel : node->seen;
+    if (std::find(seen.begin(), seen.end(), qname) != seen.end()) return false;
+    seen.push_back(qname);
+    return true;
+  }
+
+  bool IsRdf(std::string_view qname, std::string_view local) const {
+    std::string_view p, l;
+    return SplitQName(qname, &p, &l) && l == local && Resolve(p) == kRdfURI;
+  }
+
+  bool Start(std::size_t lt, std::size_t* next) {
+    const std::string_view all = mAll;
+    std::size_t k = lt + 1;
+    while (k < all.size() && !IsSpace(all[k]) && all[k] != '/' && all[k] != '>') ++k;
+    if (k >= all.size()) return false;
+    Frame frame;
+    frame.name = all.substr(lt + 1, k - lt - 1);
+    frame.scope = mScope.size();
+    // Attributes: declarations first, since they apply to the element itself.
+    std::vector<std::pair<std::string_view, std::string_view>> attributes;
+    bool empty = false;
+    for (;;) {
+      const std::size_t before = k;
+      while (k < all.size() && IsSpace(all[k])) ++k;
+      if (k >= all.size()) return false;
+      if (all[k] != '>' && all[k] != '/' && k == before) return false;  // attributes need space between
+      if (all[k] == '>') {
+        ++k;
+        break;
+      }
+      if (all[k] == '/') {
+        if (k + 1 >= all.size() || all[k + 1] != '>') return false;
+        k += 2;
+        empty = true;
+        break;
+      }
+      const std::size_t nameStart = k;
+      while (k < all.size() && all[k] != '=' && !IsSpace(all[k]) && all[k] != '>' && all[k] != '/') ++k;
+      const std::string_view name = all.substr(nameStart, k - nameStart);
+      if (k >= all.size() || all[k] != '=' || name.empty()) return false;
+      ++k;
+      if (k >= all.size() || (all[k] != '"' && all[k] != '\'')) return false;
+      const std::size_t close = all.find(all[k], k + 1);
+      if (close == std::string_view::npos) return false;
+      const std::string_view value = all.substr(k + 1, close - k - 1);
+      if (!PlainText(value, true)) return false;
+      k = close + 1;
+      for (const auto& a : attributes)
+        if (a.first == name) return false;
+      attributes.emplace_back(name, value);
+      if (name.compare(0, 6, "xmlns:") == 0) {
+        if (value.find('&') != std::string_view::npos || !Declare(name.substr(6), value)) return false;
+      } else if (name == "xmlns") {
+        return false;
+      }
+    }
+    *next = k;
+    std::string_view prefix, local;
+    if (!SplitQName(frame.name, &prefix, &local) || Resolve(prefix).empty()) return false;
+    Frame* parent = mFrames.empty() ? nullptr : &mFrames.back();
+    if (parent) {
+      if (parent->text) return false;
+      ++parent->children;
+    }
+    const Kind parentKind = parent ? parent->kind : Kind::kRoot;
+    bool resource = false, parseTypeResource = false;
+    if (!parent) {
+      if (local != "xmpmeta" || mSawRoot) return false;
+      mSawRoot = true;
+      frame.kind = Kind::kRoot;
+    } else if (parentKind == Kind::kRoot) {
+      if (!IsRdf(frame.name, "RDF") || mSawRDF) return false;
+      mSawRDF = true;
+      frame.kind = Kind::kRDF;
+    } else if (parentKind == Kind::kRDF) {
+      if (!IsRdf(frame.name, "Description")) return false;
+      frame.kind = Kind::kTopDescription;
+    } else if (parentKind == Kind::kContainer) {
+      if (!IsRdf(frame.name, "li")) return false;
+      frame.kind = Kind::kItem;
+    } else if (parentKind == Kind::kProperty || parentKind == Kind::kItem) {
+      if (parent->children > 1 || parent->lang) return false;
+      if (IsRdf(frame.name, "Bag") || IsRdf(frame.name, "Seq") || IsRdf(frame.name, "Alt")) {
+        frame.kind = Kind::kContainer;
+      } else if (IsRdf(frame.name, "Description")) {
+        frame.kind = Kind::kDescription;
+      } else {
+        return false;
+      }
+    } else {  // a node: kTopDescription, kDescription, kResource
+      if (!Property(parent, frame.name, parentKind == Kind::kTopDescription)) return false;
+      frame.kind = Kind::kProperty;
+    }
+    for (const auto& [name, value] : attributes) {
+      if (name.compare(0, 6, "xmlns:") == 0) continue;
+      if (frame.kind == Kind::kRoot) {
+        std::string_view p, l;
+        if (!SplitQName(name, &p, &l) || (p != "xml" && Resolve(p).empty())) return false;
+      } else if (frame.kind == Kind::kTopDescription) {
+        if (IsRdf(name, "about")) {
+          if (mAbout && *mAbout != value) return false;
+          mAbout = value;
+        } else if (!Property(&frame, name, true)) {
+          return false;
+        }
+      } else if (frame.kind == Kind::kDescription) {
+        if (!Property(&frame, name, false)) return false;
+      } else if (frame.kind == Kind::kProperty || frame.kind == Kind::kItem) {
+        if (name == "xml:lang") {
+          frame.lang = true;
+        } else if (IsRdf(name, "resource")) {
+          resource = true;
+        } else if (IsRdf(name, "parseType") && value == "Resource") {
+          parseTypeResource = true;
+        } else {
+          return false;
+        }
+      } else {
+        return false;  // rdf:RDF and containers carry declarations only
+      }
+    }
+    if (resource && (!empty || parseTypeResource)) return false;
+    if (parseTypeResource) {
+      if (frame.lang) return false;
+      frame.kind = Kind::kResource;
+    }
+    if (empty) {
+      mScope.resize(frame.scope);
+      return frame.kind != Kind::kRoot && frame.kind != Kind::kRDF;
+    }
+    mFrames.push_back(std::move(frame));
+    return mFrames.size() <= 64;
+  }
+
+  bool End() {
+    mScope.resize(mFrames.back().scope);
+    mFrames.pop_back();
+    return true;
+  }
+
+  std::string_view mAll;
+  std::vector<Frame> mFrames;
+  std::vector<std::pair<std::string_view, std::string_view>> mScope;
+  std::vector<std::pair<std::string_view, std::string_view>> mBindings;
+  std::vector<std::string_view> mTopLevel;
+  std::optional<std::string_view> mAbout;
+  bool mSawRoot = false;
+  bool mSawRDF = false;
+};
+
+}  // namespace
+
+bool PacketIsPlainRDF(const char* buffer, std::size_t length) {
+  while (length > 0 && (buffer[length - 1] == '\0')) --length;
+  if (length == 0 || length > (1u << 20)) return false;
+  if (!IsUTF8(reinterpret_cast<const unsigned char*>(buffer), length)) return false;
+  PlainChecker checker;
+  return checker.Run(std::string_view(buffer, length));
+}
+
 
 }  // namespace detail
 }  // namespace ovraxmp

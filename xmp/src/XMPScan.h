@@ -56,6 +56,16 @@ class PacketScanner {
 // Throws kXMPErr_BadXML when the buffer is refused by a PacketScanner.
 void RequireSanePacket(const char* buffer, std::size_t length);
 
+// True when the packet keeps to the plain shapes writers produce, which the
+// toolkit parses without dropping anything: an x:xmpmeta holding rdf:RDF
+// with rdf:Description nodes; properties as attributes or elements holding
+// text, an rdf:resource, an rdf:Bag/Seq/Alt of rdf:li, an rdf:Description
+// or rdf:parseType="Resource"; xml:lang on simple values; no duplicate,
+// aliased or unbound names, no other rdf: terms, comments, CDATA, DOCTYPE
+// or unknown entities. False means only that the packet needs the
+// toolkit's own parse to tell.
+bool PacketIsPlainRDF(const char* buffer, std::size_t length);
+
 // Looks at the XMP a media file carries before the toolkit's handlers open
 // it: JPEG segments (standard and Extended XMP), the box tree of ISO media
 // files (MP4, QuickTime), the chunk tree of RIFF files (WAV, AVI), and any
