@@ -162,6 +162,18 @@ std::string WrapBareRDF(const char* buffer, std::size_t length) {
          "</x:xmpmeta>" + text.substr(close);
 }
 
+// Typed reads are text reads plus the toolkit's conversion; a text that does
+// not convert raises bad-value and leaves the output untouched.
+template <class T, class Convert>
+bool GetConverted(const XMPMeta& meta, const std::string& ns, const std::string& name, T* value,
+                  XMP_OptionBits* options, Convert convert) {
+  std::string text;
+  if (!meta.GetProperty(ns, name, &text, options)) return false;
+  const T converted = convert(text);
+  if (value) *value = converted;
+  return true;
+}
+
 }  // namespace
 
 namespace detail {
@@ -343,48 +355,35 @@ bool XMPMeta::DoesPropertyExist(const std::string& nsIn, const std::string& name
 
 bool XMPMeta::GetProperty_Bool(const std::string& ns, const std::string& name, bool* value,
                                XMP_OptionBits* options) const {
-  std::string text;
-  if (!GetProperty(ns, name, &text, options)) return false;
-  const bool converted = XMPUtils::ConvertToBool(text);
-  if (value) *value = converted;
-  return true;
+  return GetConverted(*this, ns, name, value, options,
+                      [](const std::string& text) { return XMPUtils::ConvertToBool(text); });
 }
 
 bool XMPMeta::GetProperty_Int(const std::string& ns, const std::string& name, std::int32_t* value,
                               XMP_OptionBits* options) const {
-  std::string text;
-  if (!GetProperty(ns, name, &text, options)) return false;
-  const std::int32_t converted = XMPUtils::ConvertToInt(text);
-  if (value) *value = converted;
-  return true;
+  return GetConverted(*this, ns, name, value, options,
+                      [](const std::string& text) { return XMPUtils::ConvertToInt(text); });
 }
 
 bool XMPMeta::GetProperty_Int64(const std::string& ns, const std::string& name, std::int64_t* value,
                                 XMP_OptionBits* options) const {
-  std::string text;
-  if (!GetProperty(ns, name, &text, options)) return false;
-  const std::int64_t converted = XMPUtils::ConvertToInt64(text);
-  if (value) *value = converted;
-  return true;
+  return GetConverted(*this, ns, name, value, options,
+                      [](const std::string& text) { return XMPUtils::ConvertToInt64(text); });
 }
 
 bool XMPMeta::GetProperty_Float(const std::string& ns, const std::string& name, double* value,
                                 XMP_OptionBits* options) const {
-  std::string text;
-  if (!GetProperty(ns, name, &text, options)) return false;
-  const double converted = XMPUtils::ConvertToFloat(text);
-  if (value) *value = converted;
-  return true;
+  return GetConverted(*this, ns, name, value, options,
+                      [](const std::string& text) { return XMPUtils::ConvertToFloat(text); });
 }
 
 bool XMPMeta::GetProperty_Date(const std::string& ns, const std::string& name, XMP_DateTime* value,
                                XMP_OptionBits* options) const {
-  std::string text;
-  if (!GetProperty(ns, name, &text, options)) return false;
-  XMP_DateTime converted;
-  XMPUtils::ConvertToDate(text, &converted);
-  if (value) *value = converted;
-  return true;
+  return GetConverted(*this, ns, name, value, options, [](const std::string& text) {
+    XMP_DateTime converted;
+    XMPUtils::ConvertToDate(text, &converted);
+    return converted;
+  });
 }
 
 void XMPMeta::SetProperty_Bool(const std::string& ns, const std::string& name, bool value,
