@@ -141,6 +141,15 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
   detail::EnsureStarted();
   if (!IsRegularFile(filePath)) return false;
   const bool forUpdate = (openFlags & kXMPFiles_OpenForUpdate) != 0;
+  const auto markOpen = [&](std::string refusal) {
+    mRefusal = std::move(refusal);
+    mOpen = true;
+    mPath = filePath;
+    mOpenFlags = openFlags;
+    mHasPending = false;
+    mPending.clear();
+    return true;
+  };
   if (IsSidecarPath(filePath)) {
     if (access(PathOf(filePath).c_str(), forUpdate ? (R_OK | W_OK) : R_OK) != 0) return false;
     mSidecar = true;
@@ -155,18 +164,12 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
       // them. Read, it answers its format and has no XMP; it is never
       // opened for update.
       if (forUpdate) return false;
-      mRefusal = problem;
       mFile = nullptr;
       mSidecar = false;
       mFormat = XMPFiles::CheckFileFormat(filePath);
       mHandlerFlags = 0;
       if (mFormat != kXMP_UnknownFile) XMPFiles::GetFormatInfo(mFormat, &mHandlerFlags);
-      mOpen = true;
-      mPath = filePath;
-      mOpenFlags = openFlags;
-      mHasPending = false;
-      mPending.clear();
-      return true;
+      return markOpen(problem);
     }
     // An update goes to a copy beside the file, which replaces the original
     // in one rename at close: a failed or interrupted write leaves the
@@ -214,13 +217,7 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
     mFormat = type;
     mHandlerFlags = handler;
   }
-  mRefusal.clear();
-  mOpen = true;
-  mPath = filePath;
-  mOpenFlags = openFlags;
-  mHasPending = false;
-  mPending.clear();
-  return true;
+  return markOpen(std::string());
 }
 
 void XMPFiles::CloseFile(XMP_OptionBits closeFlags) {
