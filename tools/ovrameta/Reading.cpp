@@ -125,18 +125,19 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
   }
   if (!primitive) return false;
 
-  if (IsBagOrSeq(primitive)) {
+  const bool array = IsBagOrSeq(primitive);
+  const auto readItems = [&] {
+    ForEachItem(xmp, path, options, [&](const Path& item, int index) {
+      ValueNode child;
+      const std::string itemName = name + "[" + std::to_string(index) + "]";
+      if (ReadValue(xmp, item, itemName, options, child)) {
+        child.label = "[" + std::to_string(index) + "]";
+        node.children.push_back(std::move(child));
+      }
+    });
+  };
+  if (array) {
     node.kind = ValueNode::kArray;
-    const auto readItems = [&] {
-      ForEachItem(xmp, path, options, [&](const Path& item, int index) {
-        ValueNode child;
-        const std::string itemName = name + "[" + std::to_string(index) + "]";
-        if (ReadValue(xmp, item, itemName, options, child)) {
-          child.label = "[" + std::to_string(index) + "]";
-          node.children.push_back(std::move(child));
-        }
-      });
-    };
     const auto elementType = PropertyTypeOf(*entry);
     if (elementType && !elementType->fields.empty()) {
       readItems();
@@ -144,23 +145,9 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
       out = std::move(node);
       return true;
     }
-    // Read as a whole first: that is where an aggregate says "mixed".
-    UTF8String text;
-    GetValueResult result = ValueAbsent;
-    const bool found = GetValue(xmp, path, text, &result);
-    if (result == ValueMixed) {
-      node.mixed = true;
-      out = std::move(node);
-      return true;
-    }
-    if (!found) return false;
-    node.value = text;
-    if (options.raw) node.raw = ReadStoredText(xmp, path, options);
-    if (options.items) readItems();
-    out = std::move(node);
-    return true;
   }
 
+  // Read as a whole first: that is where an aggregate says "mixed".
   UTF8String text;
   GetValueResult result = ValueAbsent;
   const bool found = GetValue(xmp, path, text, &result);
@@ -170,12 +157,19 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
     return true;
   }
   if (!found) return false;
-  node.value = DisplayText(*entry, text);
-  // The library formats internal properties itself; dates, rationals and GPS
-  // coordinates of editorial properties are formatted here for display.
-  if (!path.internal && node.value == text) {
-    const UTF8String formatted = FormatValue(xmp, path, text);
-    if (!formatted.empty()) node.value = formatted;
+  if (array) {
+    node.value = text;
+    if (options.items) readItems();
+  } else {
+    node.value = DisplayText(*entry, text);
+    // The library formats internal properties itself; dates and GPS
+    // coordinates of editorial properties are formatted here. Their rationals
+    // (a time scale of 1/1000) read better as stored than with two decimals.
+    const bool formatHere = entry->type && (*entry->type == "date" || *entry->type == "gpscoordinate");
+    if (!path.internal && formatHere && node.value == text) {
+      const UTF8String formatted = FormatValue(xmp, path, text);
+      if (!formatted.empty()) node.value = formatted;
+    }
   }
   if (options.raw) node.raw = ReadStoredText(xmp, path, options);
   out = std::move(node);
