@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 #include <sys/wait.h>
 
+#include <algorithm>
 #include <array>
 #include <cstdlib>
 #include <tuple>
@@ -288,6 +289,50 @@ TEST_F(OvrametaTest, UnreadableFilesExitWithTwoAndTheOthersAreStillRead) {
   const std::string before = ReadFile(mDir / "harbour.jpg");
   EXPECT_EQ(Run({"set", "harbour.jpg", "missing.jpg", "dc:title=x"}).status, 2);
   EXPECT_EQ(ReadFile(mDir / "harbour.jpg"), before);
+}
+
+TEST_F(OvrametaTest, FilesWorkedOnSideBySideGiveWhatOneThreadGives) {
+  // Mixed kinds, differing values and an unreadable file in the middle.
+  const char* samples[] = {"harbour.jpg", "interview.mp4", "ambience.wav"};
+  std::vector<std::string> files;
+  for (int i = 0; i < 12; ++i) {
+    const std::string sample = samples[i % 3];
+    const std::string name = "f" + std::to_string(i) + sample.substr(sample.find('.'));
+    Sample(sample, name);
+    ASSERT_EQ(Run({"set", name, "dc:title=Title " + std::to_string(i)}).status, 0);
+    files.push_back(name);
+    if (i == 6) files.push_back("missing.jpg");
+  }
+  const auto with = [&](std::vector<std::string> head, const std::string& tail) {
+    head.insert(head.end(), files.begin(), files.end());
+    if (!tail.empty()) head.push_back(tail);
+    return head;
+  };
+  for (const auto& [command, tail] : {std::pair<std::string, std::string>{"show", ""},
+                                      {"get", "dc:title"}}) {
+    SCOPED_TRACE(command);
+    std::vector<std::string> head = {"-j", "1", command};
+    if (command == "show") head.push_back("--each");
+    const Result one = Run(with(head, tail));
+    head[1] = "4";
+    const Result four = Run(with(head, tail));
+    EXPECT_EQ(one.status, 2);
+    EXPECT_EQ(four.status, one.status);
+    EXPECT_EQ(four.out, one.out);
+    EXPECT_EQ(four.err, one.err);
+    ExpectContains(four.err, {"missing.jpg: cannot read file"});
+  }
+  const Result shown = Run(with({"show", "--each", "-j", "4"}, ""));
+  ExpectContains(shown.out, {"== f0.jpg ==", "Title 0", "== f11.wav ==", "Title 11"});
+  EXPECT_LT(shown.out.find("== f6.jpg =="), shown.out.find("== f7.mp4 =="));
+
+  files.erase(std::find(files.begin(), files.end(), "missing.jpg"));
+  const Result set = Run(with({"-j", "4", "set"}, "xmp:Label=Checked"));
+  ASSERT_EQ(set.status, 0) << set.err;
+  for (std::size_t i = 0; i < files.size(); ++i) {
+    ExpectValues({{files[i], "xmp:Label", "Checked"},
+                  {files[i], "dc:title", "Title " + std::to_string(i)}});
+  }
 }
 
 TEST_F(OvrametaTest, UsageErrorsExitWithTwo) {

@@ -8,6 +8,8 @@
 #include <iostream>
 #include <memory>
 #include <set>
+#include <sstream>
+#include <utility>
 
 #include <boost/make_shared.hpp>
 #include <fcntl.h>
@@ -17,6 +19,7 @@
 #include <ovrametadata/ovrametadata.h>
 
 #include "Names.h"
+#include "Parallel.h"
 #include "Progress.h"
 #include "Reading.h"
 #include "TextUtil.h"
@@ -35,9 +38,10 @@ constexpr XMP_FileFormat kUnknownFormat = 0x20202020;
 // Messages and exit status
 
 // Problems the library reports while the tool works; printed with the name
-// of the file being worked on.
+// of the file being worked on. The library reports on the thread that
+// works, so every thread keeps its own list.
 std::vector<std::string>& LibraryMessages() {
-  static std::vector<std::string> messages;
+  thread_local std::vector<std::string> messages;
   return messages;
 }
 
@@ -45,31 +49,55 @@ class Reporter {
  public:
   explicit Reporter(Progress* progress = nullptr) : mProgress(progress) {}
 
+  // A reporter that keeps its messages until another one relays them: the
+  // work on one file runs on a worker thread, its messages are printed in
+  // the order of the files.
+  static Reporter Buffered() {
+    Reporter reporter;
+    reporter.mBuffered = true;
+    return reporter;
+  }
+
   void SetProgress(Progress* progress) { mProgress = progress; }
 
   // "ovrameta: <context>: <message>", and the status becomes at least status.
   void Error(const std::string& context, const std::string& message, int status) {
-    if (mProgress) mProgress->Clear();
-    std::cerr << "ovrameta: " << (context.empty() ? "" : context + ": ") << message << std::endl;
+    Emit("ovrameta: " + (context.empty() ? "" : context + ": ") + message + "\n");
     mStatus = std::max(mStatus, status);
   }
 
-  // Relays what the library reported since the last call.
+  // Relays what the library reported on this thread since the last call.
   void FlushLibrary(const std::string& context) {
     auto& messages = LibraryMessages();
     for (const auto& message : messages) {
-      if (mProgress) mProgress->Clear();
-      std::cerr << "ovrameta: " << (context.empty() ? "" : context + ": ") << "warning: "
-                << message << std::endl;
+      Emit("ovrameta: " + (context.empty() ? "" : context + ": ") + "warning: " + message + "\n");
     }
     messages.clear();
+  }
+
+  // Prints what a buffered reporter kept and takes over its status.
+  void Relay(Reporter& other) {
+    if (!other.mBuffer.empty()) Emit(other.mBuffer);
+    other.mBuffer.clear();
+    mStatus = std::max(mStatus, other.mStatus);
   }
 
   int status() const { return mStatus; }
 
  private:
+  void Emit(const std::string& text) {
+    if (mBuffered) {
+      mBuffer += text;
+      return;
+    }
+    if (mProgress) mProgress->Clear();
+    std::cerr << text << std::flush;
+  }
+
   Progress* mProgress;
   int mStatus = kExitSuccess;
+  bool mBuffered = false;
+  std::string mBuffer;
 };
 
 std::string Quoted(const std::string& text) { return "\"" + text + "\""; }
@@ -88,15 +116,40 @@ std::string FileList(const std::vector<std::string>& files) {
 // ---------------------------------------------------------------------------
 // Files
 
+// Holds its write-back until Flush, so that the files of one edit can be
+// written side by side on several threads once the edit is complete.
+class BatchedFileProvider : public FileProvider {
+ public:
+  using FileProvider::FileProvider;
+
+  void WriteChanges(const std::vector<Path>& paths) override {
+    mPending.insert(mPending.end(), paths.begin(), paths.end());
+    mHasPending = true;
+  }
+
+  // Writes what the last write-backs asked for; nothing when none did.
+  void Flush() {
+    if (!mHasPending) return;
+    mHasPending = false;
+    FileProvider::WriteChanges(std::exchange(mPending, std::vector<Path>()));
+  }
+
+ private:
+  std::vector<Path> mPending;
+  bool mHasPending = false;
+};
+
 struct OpenedFile {
   std::string name;
   boost::shared_ptr<FileProvider> provider;
+  boost::shared_ptr<BatchedFileProvider> batched;  // set when opened for a batched write
 };
 
 // Opens one media file. An unreadable file, or one the toolkit cannot
 // handle, is reported (status 2) and gives false. A readable file without
 // XMP gives a provider without metadata.
-bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out) {
+bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out,
+              bool batchWrites = false) {
   std::error_code error;
   // One status for both checks: runs over many files pay per system call.
   const auto status = std::filesystem::status(name, error);
@@ -123,10 +176,17 @@ bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out) {
       given.is_absolute() || workingFolder.empty() ? std::filesystem::absolute(given, error)
                                                    : workingFolder / given;
   const UTF16String path = ToUTF16(absolute.lexically_normal().string());
-  auto provider = boost::make_shared<FileProvider>(path);
+  boost::shared_ptr<FileProvider> provider;
+  if (batchWrites) {
+    out.batched = boost::make_shared<BatchedFileProvider>(path);
+    provider = out.batched;
+  } else {
+    provider = boost::make_shared<FileProvider>(path);
+  }
   reporter.FlushLibrary(name);
   if (!provider->MetaDataAccess() && utility::GetXMPFormat(path) == kUnknownFormat) {
     reporter.Error(name, "cannot read file: not a media file with metadata support", kExitUsage);
+    out.batched.reset();
     return false;
   }
   out.name = name;
@@ -304,19 +364,37 @@ int ShowCommand(const std::vector<std::string>& files, bool each) {
   Reporter reporter;
   ReadOptions options;
   if (files.size() == 1 || each) {
+    struct Shown {
+      Reporter notes = Reporter::Buffered();
+      bool opened = false;
+      std::string text;
+    };
+    std::vector<Shown> shown(files.size());
     bool first = true;
-    for (const auto& name : files) {
-      OpenedFile file;
-      if (!OpenFile(name, reporter, file)) continue;
-      const auto schemas = ReadAllValues(file.provider, options);
-      reporter.FlushLibrary(name);
-      if (files.size() > 1) {
-        std::cout << (first ? "" : "\n") << "== " << name << " ==\n";
-      }
-      first = false;
-      if (schemas.empty()) std::cout << "(no metadata)\n";
-      PrintSchemas(std::cout, schemas);
-    }
+    ForEachInOrder(
+        files.size(), Jobs(),
+        [&](std::size_t i) {
+          Shown& out = shown[i];
+          OpenedFile file;
+          if (!OpenFile(files[i], out.notes, file)) return;
+          out.opened = true;
+          const auto schemas = ReadAllValues(file.provider, options);
+          out.notes.FlushLibrary(files[i]);
+          std::ostringstream text;
+          if (schemas.empty()) text << "(no metadata)\n";
+          PrintSchemas(text, schemas);
+          out.text = text.str();
+        },
+        [&](std::size_t i) {
+          Shown& out = shown[i];
+          reporter.Relay(out.notes);
+          if (out.opened) {
+            if (files.size() > 1) std::cout << (first ? "" : "\n") << "== " << files[i] << " ==\n";
+            first = false;
+            std::cout << out.text;
+          }
+          out = Shown();
+        });
     return reporter.status();
   }
 
@@ -325,14 +403,20 @@ int ShowCommand(const std::vector<std::string>& files, bool each) {
   reporter.SetProgress(&progress);
   auto aggregate = boost::make_shared<AggregateProvider>();
   std::size_t opened = 0;
-  for (const auto& name : files) {
-    OpenedFile file;
-    if (OpenFile(name, reporter, file)) {
-      aggregate->AddProvider(file.provider, false);
-      ++opened;
-    }
-    progress.Step();
-  }
+  std::vector<std::pair<OpenedFile, Reporter>> read(files.size(),
+                                                   {OpenedFile(), Reporter::Buffered()});
+  ForEachInOrder(
+      files.size(), Jobs(),
+      [&](std::size_t i) { OpenFile(files[i], read[i].second, read[i].first); },
+      [&](std::size_t i) {
+        reporter.Relay(read[i].second);
+        if (read[i].first.provider) {
+          aggregate->AddProvider(read[i].first.provider, false);
+          ++opened;
+        }
+        read[i].first = OpenedFile();
+        progress.Step();
+      });
   aggregate->OnProxyMetaDataChange(nullptr);
   progress.Clear();
   reporter.SetProgress(nullptr);
@@ -379,62 +463,80 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
   readOptions.items = options.json;
   readOptions.types = options.json;
   const bool bare = files.size() == 1 && names.size() == 1 && !options.json;
+  struct Read {
+    Reporter notes = Reporter::Buffered();
+    std::string text;  // for standard output
+    Json entry;        // with --json
+  };
+  std::vector<Read> reads(files.size());
   Json output = Json::array();
   Progress progress(files.size(), "files read");
   reporter.SetProgress(&progress);
-  for (const auto& fileName : files) {
-    OpenedFile file;
-    if (!OpenFile(fileName, reporter, file)) {
-      progress.Step();
-      continue;
-    }
-    MetaDataReadAccess reader(file.provider);
-    Json properties = Json::array();
-    if (names.empty()) {
-      for (const auto& schema : ReadAllValues(file.provider, readOptions)) {
-        for (const auto& value : schema.values) properties.push_back(NodeJson(value, true));
-      }
-    }
-    for (const auto& name : names) {
-      ValueNode node;
-      const bool found = ReadValue(*reader, name.path, name.name, readOptions, node);
-      // A raw read of a value that is only constructed finds nothing stored.
-      const bool stored = found && (!options.raw || node.raw || node.kind != ValueNode::kSimple);
-      if (!stored) {
-        reporter.Error(fileName, name.name + ": no " + (found ? "stored " : "") + "value",
-                       kExitAbsent);
-        if (options.json) {
-          Json missing;
-          missing["name"] = name.name;
-          missing["label"] = name.label;
-          missing["type"] = TypeText(*name.entry);
-          missing["value"] = nullptr;
-          properties.push_back(missing);
+  // Reading stored text flips a process-wide switch around each read, so
+  // raw reads run on one thread.
+  const unsigned jobs = readOptions.raw ? 1 : Jobs();
+  ForEachInOrder(
+      files.size(), jobs,
+      [&](std::size_t i) {
+        const std::string& fileName = files[i];
+        Read& out = reads[i];
+        OpenedFile file;
+        if (!OpenFile(fileName, out.notes, file)) return;
+        MetaDataReadAccess reader(file.provider);
+        Json properties = Json::array();
+        if (names.empty()) {
+          for (const auto& schema : ReadAllValues(file.provider, readOptions)) {
+            for (const auto& value : schema.values) properties.push_back(NodeJson(value, true));
+          }
         }
-        continue;
-      }
-      progress.Clear();
-      if (options.json) {
-        properties.push_back(NodeJson(node, true));
-      } else if (bare && node.kind == ValueNode::kSimple) {
-        std::cout << (options.raw && node.raw ? *node.raw : node.value) << '\n';
-      } else if (bare && node.kind == ValueNode::kArray &&
-                 (node.children.empty() || node.children.front().kind == ValueNode::kSimple)) {
-        std::cout << (options.raw && node.raw ? *node.raw : node.value) << '\n';
-      } else {
-        PrintFlat(std::cout, files.size() > 1 ? fileName + ": " : std::string(), node,
-                  options.raw);
-      }
-    }
-    reporter.FlushLibrary(fileName);
-    if (options.json) {
-      Json entry;
-      entry["file"] = fileName;
-      entry["properties"] = properties;
-      output.push_back(entry);
-    }
-    progress.Step();
-  }
+        std::ostringstream text;
+        for (const auto& name : names) {
+          ValueNode node;
+          const bool found = ReadValue(*reader, name.path, name.name, readOptions, node);
+          // A raw read of a value that is only constructed finds nothing stored.
+          const bool stored = found && (!options.raw || node.raw || node.kind != ValueNode::kSimple);
+          if (!stored) {
+            out.notes.Error(fileName, name.name + ": no " + (found ? "stored " : "") + "value",
+                            kExitAbsent);
+            if (options.json) {
+              Json missing;
+              missing["name"] = name.name;
+              missing["label"] = name.label;
+              missing["type"] = TypeText(*name.entry);
+              missing["value"] = nullptr;
+              properties.push_back(missing);
+            }
+            continue;
+          }
+          if (options.json) {
+            properties.push_back(NodeJson(node, true));
+          } else if (bare && node.kind == ValueNode::kSimple) {
+            text << (options.raw && node.raw ? *node.raw : node.value) << '\n';
+          } else if (bare && node.kind == ValueNode::kArray &&
+                     (node.children.empty() || node.children.front().kind == ValueNode::kSimple)) {
+            text << (options.raw && node.raw ? *node.raw : node.value) << '\n';
+          } else {
+            PrintFlat(text, files.size() > 1 ? fileName + ": " : std::string(), node, options.raw);
+          }
+        }
+        out.notes.FlushLibrary(fileName);
+        out.text = text.str();
+        if (options.json) {
+          out.entry["file"] = fileName;
+          out.entry["properties"] = std::move(properties);
+        }
+      },
+      [&](std::size_t i) {
+        Read& out = reads[i];
+        reporter.Relay(out.notes);
+        if (!out.text.empty()) {
+          progress.Clear();
+          std::cout << out.text;
+        }
+        if (!out.entry.is_null()) output.push_back(std::move(out.entry));
+        out = Read();
+        progress.Step();
+      });
   progress.Clear();
   if (options.json) std::cout << output.dump(2) << '\n';
   return reporter.status();
@@ -498,17 +600,26 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
   Progress progress(files.size(), "files read");
   reporter.SetProgress(&progress);
   std::vector<OpenedFile> opened;
-  for (const auto& name : files) {
-    OpenedFile file;
-    if (OpenFile(name, reporter, file)) {
-      if (access(name.c_str(), W_OK) != 0) {
-        reporter.Error(name, std::string("cannot write file: ") + std::strerror(errno),
-                       kExitUsage);
-      } else {
-        opened.push_back(file);
-      }
-    }
-    progress.Step();
+  {
+    std::vector<std::pair<OpenedFile, Reporter>> read(files.size(),
+                                                     {OpenedFile(), Reporter::Buffered()});
+    ForEachInOrder(
+        files.size(), Jobs(),
+        [&](std::size_t i) {
+          const std::string& name = files[i];
+          OpenedFile& file = read[i].first;
+          if (!OpenFile(name, read[i].second, file, true)) return;
+          if (access(name.c_str(), W_OK) != 0) {
+            read[i].second.Error(name, std::string("cannot write file: ") + std::strerror(errno),
+                                 kExitUsage);
+            file = OpenedFile();
+          }
+        },
+        [&](std::size_t i) {
+          reporter.Relay(read[i].second);
+          if (read[i].first.provider) opened.push_back(std::move(read[i].first));
+          progress.Step();
+        });
   }
   progress.Clear();
   reporter.SetProgress(nullptr);
@@ -564,6 +675,25 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
     reporter.FlushLibrary(context);
   }
   reporter.FlushLibrary(context);
+  target.reset();
+
+  // The edit is complete in every file's packet: the files are written side
+  // by side.
+  Progress written(opened.size(), "files written");
+  reporter.SetProgress(&written);
+  std::vector<Reporter> notes(opened.size(), Reporter::Buffered());
+  ForEachInOrder(
+      opened.size(), Jobs(),
+      [&](std::size_t i) {
+        opened[i].batched->Flush();
+        notes[i].FlushLibrary(opened[i].name);
+      },
+      [&](std::size_t i) {
+        reporter.Relay(notes[i]);
+        written.Step();
+      });
+  written.Clear();
+  reporter.SetProgress(nullptr);
   return reporter.status();
 }
 

@@ -81,16 +81,19 @@ std::string Quoted(const std::string& text) { return "\"" + text + "\""; }
 }  // namespace
 
 std::vector<SchemaDefinitionPtr> KnownSchemas() {
-  // The registry is filled at start-up and not changed while the tool runs.
-  static std::vector<SchemaDefinitionPtr> schemas;
-  if (!schemas.empty()) return schemas;
-  std::set<std::string> seen;
-  auto add = [&](const SchemaDefinitionPtr& schema) {
-    if (schema && seen.insert(schema->namespaceURI).second) schemas.push_back(schema);
-  };
-  for (const auto& schema : CommonSchemaDefinitions()) add(schema);
-  for (const char* uri : kAuxiliaryNamespaces) add(NamespaceDefinition(uri));
-  for (const auto& schema : DynamicSchemaDefinitions()) add(schema);
+  // The registry is filled at start-up and not changed while the tool runs;
+  // the list is made once (files are read on several threads).
+  static const std::vector<SchemaDefinitionPtr> schemas = [] {
+    std::vector<SchemaDefinitionPtr> list;
+    std::set<std::string> seen;
+    auto add = [&](const SchemaDefinitionPtr& schema) {
+      if (schema && seen.insert(schema->namespaceURI).second) list.push_back(schema);
+    };
+    for (const auto& schema : CommonSchemaDefinitions()) add(schema);
+    for (const char* uri : kAuxiliaryNamespaces) add(NamespaceDefinition(uri));
+    for (const auto& schema : DynamicSchemaDefinitions()) add(schema);
+    return list;
+  }();
   return schemas;
 }
 

@@ -192,9 +192,8 @@ struct SchemaRef {
 
 // The paths of every known property, built once: a run over many files asks
 // for the same properties in every file.
-const std::vector<SchemaRef>& KnownProperties() {
-  static std::vector<SchemaRef> schemas;
-  if (!schemas.empty()) return schemas;
+std::vector<SchemaRef> BuildKnownProperties() {
+  std::vector<SchemaRef> schemas;
   for (const auto& schema : KnownSchemas()) {
     SchemaRef ref;
     ref.schema = schema;
@@ -209,6 +208,12 @@ const std::vector<SchemaRef>& KnownProperties() {
     }
     schemas.push_back(std::move(ref));
   }
+  return schemas;
+}
+
+// Built once (files are read on several threads).
+const std::vector<SchemaRef>& KnownProperties() {
+  static const std::vector<SchemaRef> schemas = BuildKnownProperties();
   return schemas;
 }
 
@@ -247,8 +252,11 @@ std::vector<SchemaValues> ReadAllValues(const boost::shared_ptr<MetaDataProvider
   // not hold what one of its members does; it is asked path by path.
   const bool oneFile = !presence;
   if (!presence) {
+    // Not rebuilt: only its listing of stored paths is used, and a rebuild
+    // would register the packet's dynamic schemas in the process-wide
+    // tables, which files read on other threads are looking at.
     presence = boost::make_shared<AggregateProvider>();
-    presence->AddProvider(provider, true);
+    presence->AddProvider(provider, false);
   }
   StoredPaths paths;
   std::set<std::string, std::less<>> names;

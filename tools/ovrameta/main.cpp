@@ -7,12 +7,19 @@
 #include <CLI/CLI.hpp>
 
 #include "Commands.h"
+#include "Parallel.h"
 
 int main(int argc, char** argv) {
   // Output goes through std::cout only.
   std::ios::sync_with_stdio(false);
   CLI::App app{"Shows and edits the XMP metadata of media files."};
   app.require_subcommand(1);
+  // Options of the tool itself are also accepted after the command.
+  app.fallthrough();
+  unsigned jobs = 0;
+  app.add_option("-j,--jobs", jobs,
+                 "Files worked on at the same time (default: one per core, at most 8)")
+      ->check(CLI::Range(1u, ovrameta::kMaxJobs));
   app.footer(
       "Names are prefix:Property, prefix:Struct/prefix:Field or prefix:Array[n].\n"
       "Exit status: 0 success, 1 a named value is absent, 2 usage error or unreadable file.");
@@ -49,6 +56,7 @@ int main(int argc, char** argv) {
     return status == 0 ? 0 : ovrameta::kExitUsage;
   }
 
+  if (jobs != 0) ovrameta::SetJobs(jobs);
   ovrameta::Session session;
   if (!session.ok()) return ovrameta::kExitUsage;
   if (*show) return ovrameta::ShowCommand(showFiles, each);
