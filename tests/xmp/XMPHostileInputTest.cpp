@@ -276,23 +276,37 @@ TEST(XMPHostileInput, RelativePathsWithAFolderPartReachTheHandlers) {
   EXPECT_EQ(StoredFormat((dir / "c" / "x.jpg").string()), "rel2");
 }
 
-TEST(XMPHostileInput, WritesReplaceTheFileInsteadOfRewritingItInPlace) {
-  // The MP4 handler would rewrite the original in place; through a copy
-  // that replaces it, the path ends up at a new inode with the same
-  // permissions, and nothing else is left in the folder.
-  ovratest::TempDir dir;
-  const std::string path = (dir / "safe.mp4").string();
-  ovratest::WriteFile(path, Mp4());
-  ASSERT_EQ(chmod(path.c_str(), 0640), 0);
-  struct stat before {};
-  ASSERT_EQ(stat(path.c_str(), &before), 0);
-  PutFormat(path, "video/mp4");
-  struct stat after {};
-  ASSERT_EQ(stat(path.c_str(), &after), 0);
-  EXPECT_NE(before.st_ino, after.st_ino);
-  EXPECT_EQ(after.st_mode & 07777, 0640u);
-  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir.path()), std::filesystem::directory_iterator()), 1);
-  EXPECT_EQ(StoredFormat(path), "video/mp4");
+TEST(XMPHostileInput, WritesReplaceTheFileAndNeverWriteIntoTheOriginal) {
+  // Some handlers rewrite a file in place (MP4, MP3), others through a file
+  // of their own (JPEG). Either way the path ends up at a new inode with the
+  // file's own permissions, the old inode (still reachable through a second
+  // name) is byte for byte what it was, and nothing else is left over. The
+  // second write is shorter than the first, which the PNG handler would
+  // store in place over a longer packet, leaving stale bytes behind it.
+  const std::pair<const char*, std::string> files[] = {
+      {"safe.jpg", xmptest::media::Jpeg()}, {"safe.mp4", xmptest::media::Mp4()},
+      {"safe.wav", xmptest::media::Wav()},  {"safe.png", xmptest::media::Png()},
+      {"safe.tif", xmptest::media::Tiff()}, {"safe.mp3", xmptest::media::Mp3()}};
+  for (const auto& [name, bytes] : files) {
+    SCOPED_TRACE(name);
+    ovratest::TempDir dir;
+    const std::string path = (dir / name).string();
+    const std::string kept = (dir / "kept").string();
+    ovratest::WriteFile(path, bytes);
+    ASSERT_EQ(chmod(path.c_str(), 0640), 0);
+    ASSERT_EQ(link(path.c_str(), kept.c_str()), 0);
+    struct stat before {};
+    ASSERT_EQ(stat(path.c_str(), &before), 0);
+    PutFormat(path, "video/x-test");
+    PutFormat(path, "video/mp4");
+    struct stat after {};
+    ASSERT_EQ(stat(path.c_str(), &after), 0);
+    EXPECT_NE(before.st_ino, after.st_ino);
+    EXPECT_EQ(after.st_mode & 07777, 0640u);
+    EXPECT_EQ(ovratest::ReadFile(kept), bytes);
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir.path()), std::filesystem::directory_iterator()), 2);
+    EXPECT_EQ(StoredFormat(path), "video/mp4");
+  }
 }
 
 TEST(XMPHostileInput, WritesThroughASymbolicLinkReplaceTheFileItNames) {

@@ -7,12 +7,18 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdint>
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <memory>
+#include <random>
 #include <sstream>
 #include <utility>
+#include <vector>
+
+#include <boost/crc.hpp>
 
 #include <ovracore/FileSupport.h>
 #include <ovracore/Strings.h>
@@ -46,6 +52,49 @@ std::string ToolkitPath(const std::string& utf8) {
   return ec ? utf8 : absolute.lexically_normal().u8string();
 }
 
+// The byte ranges of a PNG file's chunks that carry XMP, in file order;
+// empty when the file does not start as a PNG file does.
+std::vector<std::pair<off_t, off_t>> PNGPacketChunks(int fd, off_t size) {
+  static const unsigned char kSignature[8] = {0x89, 'P', 'N', 'G', '\r', '\n', 0x1A, '\n'};
+  static const char kKeyword[] = "XML:com.adobe.xmp";  // with its NUL
+  std::vector<std::pair<off_t, off_t>> chunks;
+  unsigned char head[8];
+  if (::pread(fd, head, sizeof head, 0) != 8 || std::memcmp(head, kSignature, 8) != 0) return chunks;
+  for (off_t pos = 8; pos + 12 <= size;) {
+    if (::pread(fd, head, sizeof head, pos) != 8) break;
+    const off_t length = (off_t(head[0]) << 24) | (off_t(head[1]) << 16) | (off_t(head[2]) << 8) | off_t(head[3]);
+    const off_t end = pos + 12 + length;
+    if (end > size) break;
+    char keyword[sizeof kKeyword];
+    if (std::memcmp(head + 4, "iTXt", 4) == 0 && length >= off_t(sizeof keyword) &&
+        ::pread(fd, keyword, sizeof keyword, pos + 8) == off_t(sizeof keyword) &&
+        std::memcmp(keyword, kKeyword, sizeof keyword) == 0) {
+      chunks.emplace_back(pos, end);
+    }
+    if (std::memcmp(head + 4, "IEND", 4) == 0) break;
+    pos = end;
+  }
+  return chunks;
+}
+
+// Copies the bytes [from, to) of in (to < 0: up to the end) to the end of out.
+bool CopyRange(int in, int out, off_t from, off_t to, char* buffer, std::size_t size) {
+  for (off_t at = from; to < 0 || at < to;) {
+    const std::size_t want = to < 0 ? size : static_cast<std::size_t>(std::min<off_t>(to - at, off_t(size)));
+    const ssize_t got = ::pread(in, buffer, want, at);
+    if (got < 0 && errno == EINTR) continue;
+    if (got < 0) return false;
+    if (got == 0) return to < 0;
+    for (ssize_t done = 0; done < got;) {
+      const ssize_t put = ::write(out, buffer + done, static_cast<std::size_t>(got - done));
+      if (put < 0 && errno != EINTR) return false;
+      if (put > 0) done += put;
+    }
+    at += got;
+  }
+  return true;
+}
+
 // A copy of the file beside it (same folder, so that a rename replaces the
 // original atomically; same extension, which the handlers look at), with
 // the original's permission bits. Empty when it cannot be made.
@@ -65,20 +114,7 @@ std::string CopyBeside(const std::string& target) {
     const std::size_t size = static_cast<std::size_t>(
         std::clamp<off_t>(info.st_size, off_t(4096), off_t(1) << 20));
     const std::unique_ptr<char[]> buffer(new char[size]);
-    for (ssize_t got; ok && (got = ::read(in, buffer.get(), size)) != 0;) {
-      if (got < 0) {
-        ok = errno == EINTR;
-        continue;
-      }
-      for (ssize_t done = 0; ok && done < got;) {
-        const ssize_t put = ::write(out, buffer.get() + done, static_cast<std::size_t>(got - done));
-        if (put < 0) {
-          ok = errno == EINTR;
-        } else {
-          done += put;
-        }
-      }
-    }
+    ok = ok && CopyRange(in, out, 0, -1, buffer.get(), size);
   }
   if (in >= 0) ::close(in);
   if (::close(out) != 0) ok = false;
@@ -87,6 +123,94 @@ std::string CopyBeside(const std::string& target) {
     return std::string();
   }
   return name;
+}
+
+// Stores packet as the XMP of a PNG file. The toolkit's PNG handler updates
+// a packet in place without changing its chunk's length, so a shorter packet
+// leaves stale bytes behind it and the file's XMP no longer parses; PNG has
+// no other metadata to reconcile, so the layer writes the chunk itself. The
+// new chunk takes the place of the first XMP chunk, or follows the header
+// chunk; further XMP chunks are dropped. The file is written beside the
+// original with its permission bits, synced and renamed over it. False
+// when anything fails; the original then stays as it was.
+bool WritePNGPacket(const std::string& target, const std::string& packet, unsigned mode) {
+  const fs::path path = PathOf(target);
+  const int in = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+  if (in < 0) return false;
+  struct stat info {};
+  unsigned char head[8];
+  if (::fstat(in, &info) != 0 || ::pread(in, head, sizeof head, 8) != 8 || std::memcmp(head + 4, "IHDR", 4) != 0) {
+    ::close(in);
+    return false;
+  }
+  const off_t headerEnd = 8 + 12 + ((off_t(head[0]) << 24) | (off_t(head[1]) << 16) | (off_t(head[2]) << 8) | off_t(head[3]));
+  const auto chunks = PNGPacketChunks(in, info.st_size);
+  const off_t insertAt = chunks.empty() ? headerEnd : chunks.front().first;
+
+  // iTXt: keyword, no compression, no language, no translated keyword.
+  std::string chunk(4, '\0');
+  chunk += "iTXt";
+  chunk.append("XML:com.adobe.xmp\0\0\0\0\0", 22);
+  chunk += packet;
+  const std::uint64_t length = chunk.size() - 8;
+  if (length > 0x7FFFFFFFu) {
+    ::close(in);
+    return false;
+  }
+  for (int i = 0; i < 4; ++i) chunk[i] = static_cast<char>((length >> (24 - 8 * i)) & 0xFF);
+  boost::crc_32_type crc;
+  crc.process_bytes(chunk.data() + 4, chunk.size() - 4);
+  for (int i = 0; i < 4; ++i) chunk += static_cast<char>((crc.checksum() >> (24 - 8 * i)) & 0xFF);
+
+  const std::string ext = path.extension().u8string();
+  std::string name = (path.parent_path() / ("." + path.filename().u8string() + ".ovra-XXXXXX" + ext)).u8string();
+  const int out = ::mkstemps(name.data(), static_cast<int>(ext.size()));
+  if (out < 0) {
+    ::close(in);
+    return false;
+  }
+  const std::size_t size = static_cast<std::size_t>(std::clamp<off_t>(info.st_size, off_t(4096), off_t(1) << 20));
+  const std::unique_ptr<char[]> buffer(new char[size]);
+  bool ok = ::fchmod(out, mode) == 0 && CopyRange(in, out, 0, insertAt, buffer.get(), size);
+  for (std::size_t done = 0; ok && done < chunk.size();) {
+    const ssize_t put = ::write(out, chunk.data() + done, chunk.size() - done);
+    if (put < 0 && errno != EINTR) ok = false;
+    if (put > 0) done += static_cast<std::size_t>(put);
+  }
+  off_t at = insertAt;  // the first XMP chunk, if any, starts here
+  for (const auto& [begin, end] : chunks) {
+    ok = ok && CopyRange(in, out, at, begin, buffer.get(), size);
+    at = end;
+  }
+  ok = ok && CopyRange(in, out, at, -1, buffer.get(), size) && ::fsync(out) == 0;
+  ::close(in);
+  if (::close(out) != 0) ok = false;
+  if (!ok || ::rename(name.c_str(), path.c_str()) != 0) {
+    ::unlink(name.c_str());
+    return false;
+  }
+  return true;
+}
+
+// A second name for the file beside it (same folder and extension, so that
+// the toolkit picks the same handler). Opened by the toolkit for a safe
+// update, the file behind it is only read: the toolkit writes a new file
+// and puts it under the second name. Cheaper than a copy; empty when the
+// file system has no hard links.
+std::string LinkBeside(const std::string& target) {
+  static const char kLetters[] = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789";
+  thread_local std::mt19937_64 random{std::random_device{}()};
+  const fs::path path = PathOf(target);
+  const std::string stem = (path.parent_path() / ("." + path.filename().u8string() + ".ovra-")).u8string();
+  const std::string ext = path.extension().u8string();
+  for (int attempt = 0; attempt < 16; ++attempt) {
+    std::string name = stem;
+    for (int i = 0; i < 6; ++i) name += kLetters[random() % (sizeof kLetters - 1)];
+    name += ext;
+    if (::link(path.c_str(), PathOf(name).c_str()) == 0) return name;
+    if (errno != EEXIST) break;
+  }
+  return std::string();
 }
 
 bool SyncFile(const std::string& utf8) {
@@ -139,6 +263,7 @@ XMPFiles::~XMPFiles() {
 bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_OptionBits openFlags) {
   if (mOpen) detail::Throw(kXMPErr_BadObject, "a file is already open");
   detail::EnsureStarted();
+  mPNGWrite = false;
   if (!IsRegularFile(filePath)) return false;
   const bool forUpdate = (openFlags & kXMPFiles_OpenForUpdate) != 0;
   const auto markOpen = [&](std::string refusal) {
@@ -171,20 +296,35 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
       if (mFormat != kXMP_UnknownFile) XMPFiles::GetFormatInfo(mFormat, &mHandlerFlags);
       return markOpen(problem);
     }
-    // An update goes to a copy beside the file, which replaces the original
-    // in one rename at close: a failed or interrupted write leaves the
-    // original as it was. (The toolkit's own safe update moves the original
-    // aside first, so an interruption can leave nothing under its name.)
-    // Formats spread over folders, or whose handler cannot rewrite a whole
-    // file, are updated by the handler in place.
+    // An update goes to a file beside the original, which replaces it in
+    // one rename at close: a failed or interrupted write leaves the
+    // original as it was. (The toolkit's own safe update of the original
+    // moves it aside first, so an interruption can leave nothing under its
+    // name.) Only formats spread over folders are updated in place.
     std::string target = ToolkitPath(filePath);
     std::string workCopy;
+    bool linked = false;
+    bool pngWrite = false;
+    struct stat targetInfo {};
+    XMP_OptionBits toolkitFlags = openFlags;
     if (forUpdate) {
-      if (access(PathOf(target).c_str(), W_OK) != 0) return false;
+      if (access(PathOf(target).c_str(), W_OK) != 0 || ::stat(PathOf(target).c_str(), &targetInfo) != 0)
+        return false;
+      // A handler that can update safely gets a second name of the file
+      // and writes a new one; the others update a private copy in place.
+      // PNG packets are written by the layer (see WritePNGPacket): the
+      // toolkit only reads the file.
       XMP_OptionBits handler = 0;
-      if (GetFormatInfo(CheckFileFormat(target), &handler) && (handler & kXMPFiles_AllowsSafeUpdate) &&
-          !(handler & kXMPFiles_FolderBasedFormat)) {
-        workCopy = CopyBeside(target);
+      const XMP_FileFormat targetFormat = CheckFileFormat(target);
+      pngWrite = targetFormat == kXMP_PNGFile;
+      if (pngWrite) {
+        toolkitFlags = (openFlags & ~kXMPFiles_OpenForUpdate) | kXMPFiles_OpenForRead;
+      } else if (GetFormatInfo(targetFormat, &handler) && !(handler & kXMPFiles_FolderBasedFormat)) {
+        if (handler & kXMPFiles_AllowsSafeUpdate) {
+          workCopy = LinkBeside(target);
+          linked = !workCopy.empty();
+        }
+        if (!linked) workCopy = CopyBeside(target);
         if (workCopy.empty()) return false;
       }
     }
@@ -194,13 +334,17 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
       detail::ThrowLastError(kXMPErr_NoMemory, "creating a file object");
     }
     const std::string& toolkitPath = workCopy.empty() ? target : workCopy;
-    if (!xmp_files_open(file, toolkitPath.c_str(), static_cast<XmpOpenFileOptions>(openFlags))) {
+    if (!xmp_files_open(file, toolkitPath.c_str(), static_cast<XmpOpenFileOptions>(toolkitFlags))) {
       xmp_files_free(file);
       if (!workCopy.empty()) ::unlink(PathOf(workCopy).c_str());
       return false;
     }
     mWorkCopy = workCopy;
+    mWorkLinked = linked;
+    mPNGWrite = pngWrite;
     mTarget = target;
+    mTargetMode = static_cast<unsigned>(targetInfo.st_mode & 07777);
+    mTargetInode = static_cast<unsigned long long>(targetInfo.st_ino);
     mPut = false;
     // The toolkit stores flag combinations outside the enums' ranges: read
     // them as plain integers.
@@ -234,9 +378,25 @@ void XMPFiles::CloseFile(XMP_OptionBits closeFlags) {
   if (!mFile) return;  // refused: nothing was opened
   XmpFilePtr file = F(mFile);
   mFile = nullptr;
+  if (mPNGWrite) {
+    xmp_files_close(file, XMP_CLOSE_NOOPTION);
+    xmp_files_free(file);
+    const bool write = std::exchange(mHasPending, false);
+    const std::string packet = std::exchange(mPending, std::string());
+    if (write && !WritePNGPacket(mTarget, packet, mTargetMode))
+      detail::Throw(kXMPErr_ExternalFailure, "writing \"" + mPath + "\"");
+    return;
+  }
   const std::string workCopy = std::exchange(mWorkCopy, std::string());
-  // The work copy is written in place; the original is replaced below.
-  if (!workCopy.empty()) closeFlags &= ~kXMPFiles_UpdateSafely;
+  // A second name of the original must get a new file, never a write into
+  // the one it names; a copy of its own is written in place. Either
+  // replaces the original below.
+  if (!workCopy.empty()) {
+    if (mWorkLinked)
+      closeFlags |= kXMPFiles_UpdateSafely;
+    else
+      closeFlags &= ~kXMPFiles_UpdateSafely;
+  }
   const bool ok = xmp_files_close(file, static_cast<XmpCloseFileOptions>(closeFlags));
   const int id = ok ? 0 : xmp_get_error();
   xmp_files_free(file);
@@ -253,7 +413,17 @@ void XMPFiles::CloseFile(XMP_OptionBits closeFlags) {
     ::unlink(copy.c_str());
     return;
   }
-  if (!SyncFile(workCopy) || ::rename(copy.c_str(), PathOf(mTarget).c_str()) != 0) {
+  struct stat written {};
+  if (::lstat(copy.c_str(), &written) != 0) detail::Throw(kXMPErr_ExternalFailure, "writing \"" + mPath + "\"");
+  if (mWorkLinked && static_cast<unsigned long long>(written.st_ino) == mTargetInode) {
+    // The toolkit found nothing to change and left the original's second
+    // name as it was.
+    ::unlink(copy.c_str());
+    return;
+  }
+  // The toolkit's new file has default permissions; the file keeps its own.
+  if (::chmod(copy.c_str(), mTargetMode) != 0 || !SyncFile(workCopy) ||
+      ::rename(copy.c_str(), PathOf(mTarget).c_str()) != 0) {
     ::unlink(copy.c_str());
     detail::Throw(kXMPErr_ExternalFailure, "writing \"" + mPath + "\"");
   }
@@ -339,6 +509,7 @@ bool XMPFiles::CanPutXMP(const XMPMeta& xmpObj) {
   if (!(mOpenFlags & kXMPFiles_OpenForUpdate)) return false;
   if (mSidecar) return true;
   if (!mFile) return false;
+  if (mPNGWrite) return true;
   const XMPMeta clean = WithoutTransient(xmpObj);
   return xmp_files_can_put_xmp(F(mFile), clean.GetInternalRef()->Xmp());
 }
@@ -353,6 +524,14 @@ void XMPFiles::PutXMP(const XMPMeta& xmpObj) {
     return;
   }
   const XMPMeta clean = WithoutTransient(xmpObj);
+  if (mPNGWrite) {
+    // A read-only packet without padding, as the toolkit's PNG handler
+    // writes it.
+    clean.SerializeToBuffer(&mPending, kXMP_ReadOnlyPacket, 0);
+    mHasPending = true;
+    mPut = true;
+    return;
+  }
   if (!xmp_files_put_xmp(F(mFile), clean.GetInternalRef()->Xmp()))
     detail::ThrowLastError(kXMPErr_BadFileFormat, "writing XMP into \"" + mPath + "\"");
   mPut = true;

@@ -84,11 +84,17 @@ class XMPFiles {
   XMP_OptionBits mOpenFlags = 0;
   XMP_FileFormat mFormat = kXMP_UnknownFile;
   XMP_OptionBits mHandlerFlags = 0;
-  std::string mPending;  // sidecar packet to write at close
+  std::string mPending;  // packet the layer writes at close (sidecars, PNG)
   bool mHasPending = false;
   std::string mRefusal;
-  std::string mWorkCopy;  // the copy an update is written to, empty when in place
-  std::string mTarget;    // the file the work copy replaces
+  // The name an update is written under, empty when in place: a second name
+  // of the file (mWorkLinked) or a copy of it.
+  std::string mWorkCopy;
+  bool mWorkLinked = false;
+  bool mPNGWrite = false;  // the layer writes the packet (mPending) itself
+  std::string mTarget;               // the file the work copy replaces
+  unsigned mTargetMode = 0;          // its permission bits
+  unsigned long long mTargetInode = 0;
   bool mPut = false;
 };
 
