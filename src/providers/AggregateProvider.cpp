@@ -187,9 +187,10 @@ void AggregateProvider::GetAllPathsForDynamicSchema(
     try {
       const ovraxmp::XMPMeta meta(provider->MetaDataAccess());
       ovraxmp::XMPIterator properties(meta, namespaceURI, ovraxmp::kXMP_IterProperties);
-      std::string ns, path, value;
+      // Only the paths are needed: values are not fetched.
+      std::string path;
       ovraxmp::XMP_OptionBits options = 0;
-      while (properties.Next(&ns, &path, &value, &options)) {
+      while (properties.Next(nullptr, &path, nullptr, &options)) {
         if (path.empty() || !seen.insert(path).second) continue;
         const UTF8String name = LocalName(path);
         const UTF16String name16 = ovracore::ToUTF16(name);
