@@ -309,6 +309,40 @@ TEST(XMPHostileInput, WritesReplaceTheFileAndNeverWriteIntoTheOriginal) {
   }
 }
 
+TEST(XMPHostileInput, PNGWritesReplaceOnlyThePacketChunkTheToolkitReads) {
+  // Every chunk around the packet stays, a compressed XMP chunk (which the
+  // toolkit does not read) included, and every chunk's checksum holds.
+  using xmptest::media::PngChunk;
+  const std::string png = xmptest::media::Png();
+  const std::string header = png.substr(0, 8 + 25), rest = png.substr(8 + 25);
+  const std::string comment = PngChunk("tEXt", std::string("Comment\0keep me", 15));
+  const std::string compressed = PngChunk("iTXt", std::string("XML:com.adobe.xmp\0\1\0\0\0x\x9c", 24));
+  ovratest::TempDir dir;
+  const std::string path = (dir / "chunks.png").string();
+  ovratest::WriteFile(path, header + comment + compressed + rest);
+  PutFormat(path, "image/png; a longer value that the second write shortens");
+  PutFormat(path, "image/png");
+  EXPECT_EQ(StoredFormat(path), "image/png");
+
+  const std::string bytes = ovratest::ReadFile(path);
+  ASSERT_EQ(bytes.compare(0, header.size(), header), 0);
+  EXPECT_NE(bytes.find(comment), std::string::npos);
+  EXPECT_NE(bytes.find(compressed), std::string::npos);
+  int packets = 0;
+  for (std::size_t pos = 8; pos + 12 <= bytes.size();) {
+    const auto byte = [&](std::size_t i) { return std::uint32_t(static_cast<unsigned char>(bytes[i])); };
+    const std::uint32_t length = byte(pos) << 24 | byte(pos + 1) << 16 | byte(pos + 2) << 8 | byte(pos + 3);
+    ASSERT_LE(pos + 12 + length, bytes.size());
+    const std::string body = bytes.substr(pos + 4, 4 + length);
+    const std::uint32_t stored = byte(pos + 8 + length) << 24 | byte(pos + 9 + length) << 16 |
+                                 byte(pos + 10 + length) << 8 | byte(pos + 11 + length);
+    EXPECT_EQ(stored, xmptest::media::Crc32(body)) << body.substr(0, 4);
+    if (body.compare(0, 23, std::string("iTXtXML:com.adobe.xmp\0\0", 23)) == 0) ++packets;
+    pos += 12 + length;
+  }
+  EXPECT_EQ(packets, 1);
+}
+
 TEST(XMPHostileInput, WritesThroughASymbolicLinkReplaceTheFileItNames) {
   ovratest::TempDir dir;
   std::filesystem::create_directories(dir / "real");

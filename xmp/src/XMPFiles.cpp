@@ -52,29 +52,31 @@ std::string ToolkitPath(const std::string& utf8) {
   return ec ? utf8 : absolute.lexically_normal().u8string();
 }
 
-// The byte ranges of a PNG file's chunks that carry XMP, in file order;
-// empty when the file does not start as a PNG file does.
-std::vector<std::pair<off_t, off_t>> PNGPacketChunks(int fd, off_t size) {
+// The first chunk of a PNG file that carries XMP as plain text (the one the
+// toolkit reads), as the byte range [begin, end). False when there is none
+// or the file does not start as a PNG file does.
+bool FindPNGPacketChunk(int fd, off_t size, off_t* begin, off_t* end) {
   static const unsigned char kSignature[8] = {0x89, 'P', 'N', 'G', '\r', '\n', 0x1A, '\n'};
-  static const char kKeyword[] = "XML:com.adobe.xmp";  // with its NUL
-  std::vector<std::pair<off_t, off_t>> chunks;
+  // The keyword with its NUL, then the flag for no compression.
+  static const char kStart[] = "XML:com.adobe.xmp\0";
   unsigned char head[8];
-  if (::pread(fd, head, sizeof head, 0) != 8 || std::memcmp(head, kSignature, 8) != 0) return chunks;
+  if (::pread(fd, head, sizeof head, 0) != 8 || std::memcmp(head, kSignature, 8) != 0) return false;
   for (off_t pos = 8; pos + 12 <= size;) {
     if (::pread(fd, head, sizeof head, pos) != 8) break;
     const off_t length = (off_t(head[0]) << 24) | (off_t(head[1]) << 16) | (off_t(head[2]) << 8) | off_t(head[3]);
-    const off_t end = pos + 12 + length;
-    if (end > size) break;
-    char keyword[sizeof kKeyword];
-    if (std::memcmp(head + 4, "iTXt", 4) == 0 && length >= off_t(sizeof keyword) &&
-        ::pread(fd, keyword, sizeof keyword, pos + 8) == off_t(sizeof keyword) &&
-        std::memcmp(keyword, kKeyword, sizeof keyword) == 0) {
-      chunks.emplace_back(pos, end);
+    if (pos + 12 + length > size) break;
+    char start[sizeof kStart];
+    if (std::memcmp(head + 4, "iTXt", 4) == 0 && length >= off_t(sizeof start) &&
+        ::pread(fd, start, sizeof start, pos + 8) == off_t(sizeof start) &&
+        std::memcmp(start, kStart, sizeof start) == 0) {
+      *begin = pos;
+      *end = pos + 12 + length;
+      return true;
     }
     if (std::memcmp(head + 4, "IEND", 4) == 0) break;
-    pos = end;
+    pos += 12 + length;
   }
-  return chunks;
+  return false;
 }
 
 // Copies the bytes [from, to) of in (to < 0: up to the end) to the end of out.
@@ -129,8 +131,8 @@ std::string CopyBeside(const std::string& target) {
 // a packet in place without changing its chunk's length, so a shorter packet
 // leaves stale bytes behind it and the file's XMP no longer parses; PNG has
 // no other metadata to reconcile, so the layer writes the chunk itself. The
-// new chunk takes the place of the first XMP chunk, or follows the header
-// chunk; further XMP chunks are dropped. The file is written beside the
+// new chunk takes the place of the one the toolkit reads, or follows the
+// header chunk; every other chunk stays. The file is written beside the
 // original with its permission bits, synced and renamed over it. False
 // when anything fails; the original then stays as it was.
 bool WritePNGPacket(const std::string& target, const std::string& packet, unsigned mode) {
@@ -144,8 +146,8 @@ bool WritePNGPacket(const std::string& target, const std::string& packet, unsign
     return false;
   }
   const off_t headerEnd = 8 + 12 + ((off_t(head[0]) << 24) | (off_t(head[1]) << 16) | (off_t(head[2]) << 8) | off_t(head[3]));
-  const auto chunks = PNGPacketChunks(in, info.st_size);
-  const off_t insertAt = chunks.empty() ? headerEnd : chunks.front().first;
+  off_t oldBegin = headerEnd, oldEnd = headerEnd;  // nothing to replace: insert
+  FindPNGPacketChunk(in, info.st_size, &oldBegin, &oldEnd);
 
   // iTXt: keyword, no compression, no language, no translated keyword.
   std::string chunk(4, '\0');
@@ -171,18 +173,13 @@ bool WritePNGPacket(const std::string& target, const std::string& packet, unsign
   }
   const std::size_t size = static_cast<std::size_t>(std::clamp<off_t>(info.st_size, off_t(4096), off_t(1) << 20));
   const std::unique_ptr<char[]> buffer(new char[size]);
-  bool ok = ::fchmod(out, mode) == 0 && CopyRange(in, out, 0, insertAt, buffer.get(), size);
+  bool ok = ::fchmod(out, mode) == 0 && CopyRange(in, out, 0, oldBegin, buffer.get(), size);
   for (std::size_t done = 0; ok && done < chunk.size();) {
     const ssize_t put = ::write(out, chunk.data() + done, chunk.size() - done);
     if (put < 0 && errno != EINTR) ok = false;
     if (put > 0) done += static_cast<std::size_t>(put);
   }
-  off_t at = insertAt;  // the first XMP chunk, if any, starts here
-  for (const auto& [begin, end] : chunks) {
-    ok = ok && CopyRange(in, out, at, begin, buffer.get(), size);
-    at = end;
-  }
-  ok = ok && CopyRange(in, out, at, -1, buffer.get(), size) && ::fsync(out) == 0;
+  ok = ok && CopyRange(in, out, oldEnd, -1, buffer.get(), size) && ::fsync(out) == 0;
   ::close(in);
   if (::close(out) != 0) ok = false;
   if (!ok || ::rename(name.c_str(), path.c_str()) != 0) {
