@@ -291,6 +291,19 @@ TEST_F(OvrametaTest, UnreadableFilesExitWithTwoAndTheOthersAreStillRead) {
   EXPECT_EQ(ReadFile(mDir / "harbour.jpg"), before);
 }
 
+TEST_F(OvrametaTest, AWriteThatFailsIsReportedAndLeavesTheFile) {
+  // With a file size limit below the photo's size (and the limit's signal
+  // ignored) every write fails, whoever runs the tests.
+  Sample("harbour.jpg");
+  const std::string photo = ReadFile(mDir / "harbour.jpg");
+  ASSERT_GT(photo.size(), 4096u);
+  const std::string command = "cd " + Quote(mDir.path().string()) + " && trap '' XFSZ && ulimit -f 4 && " +
+                              Command({"set", "harbour.jpg", "dc:title=Lost"}) + " 2>&1; echo \"status $?\"";
+  const std::string output = RunCommand(command);
+  ExpectContains(output, {"harbour.jpg: cannot write file", "status 2"});
+  EXPECT_EQ(ReadFile(mDir / "harbour.jpg"), photo);
+}
+
 TEST_F(OvrametaTest, FilesWorkedOnSideBySideGiveWhatOneThreadGives) {
   // Mixed kinds, differing values and an unreadable file in the middle.
   const char* samples[] = {"harbour.jpg", "interview.mp4", "ambience.wav"};
