@@ -316,7 +316,8 @@ TEST(XMPHostileInput, PNGWritesReplaceOnlyThePacketChunkTheToolkitReads) {
   const std::string png = xmptest::media::Png();
   const std::string header = png.substr(0, 8 + 25), rest = png.substr(8 + 25);
   const std::string comment = PngChunk("tEXt", std::string("Comment\0keep me", 15));
-  const std::string compressed = PngChunk("iTXt", std::string("XML:com.adobe.xmp\0\1\0\0\0x\x9c", 24));
+  const std::string keyword = PngXMPKeyword();
+  const std::string compressed = PngChunk("iTXt", keyword + std::string("\0\1\0\0\0x\x9c", 7));
   ovratest::TempDir dir;
   const std::string path = (dir / "chunks.png").string();
   ovratest::WriteFile(path, header + comment + compressed + rest);
@@ -337,7 +338,7 @@ TEST(XMPHostileInput, PNGWritesReplaceOnlyThePacketChunkTheToolkitReads) {
     const std::uint32_t stored = byte(pos + 8 + length) << 24 | byte(pos + 9 + length) << 16 |
                                  byte(pos + 10 + length) << 8 | byte(pos + 11 + length);
     EXPECT_EQ(stored, xmptest::media::Crc32(body)) << body.substr(0, 4);
-    if (body.compare(0, 23, std::string("iTXtXML:com.adobe.xmp\0\0", 23)) == 0) ++packets;
+    if (body.compare(0, 6 + keyword.size(), "iTXt" + keyword + std::string(2, '\0')) == 0) ++packets;
     pos += 12 + length;
   }
   EXPECT_EQ(packets, 1);

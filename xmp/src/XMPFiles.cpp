@@ -52,23 +52,37 @@ std::string ToolkitPath(const std::string& utf8) {
   return ec ? utf8 : absolute.lexically_normal().u8string();
 }
 
+// The keyword of the PNG text chunk that carries XMP: "XML:", the host of
+// the XMP namespaces with its labels reversed and without "ns", ".xmp".
+const std::string& PNGPacketKeyword() {
+  static const std::string keyword = [] {
+    const std::string uri = kXMP_NS_XMP;
+    const std::size_t hostStart = uri.find("//") + 2;
+    std::string host = uri.substr(hostStart, uri.find('/', hostStart) - hostStart);
+    std::string reversed;
+    for (std::size_t dot; (dot = host.rfind('.')) != std::string::npos; host.erase(dot))
+      reversed += host.substr(dot + 1) + ".";
+    return "XML:" + reversed + "xmp";
+  }();
+  return keyword;
+}
+
 // The first chunk of a PNG file that carries XMP as plain text (the one the
 // toolkit reads), as the byte range [begin, end). False when there is none
 // or the file does not start as a PNG file does.
 bool FindPNGPacketChunk(int fd, off_t size, off_t* begin, off_t* end) {
   static const unsigned char kSignature[8] = {0x89, 'P', 'N', 'G', '\r', '\n', 0x1A, '\n'};
   // The keyword with its NUL, then the flag for no compression.
-  static const char kStart[] = "XML:com.adobe.xmp\0";
+  const std::string expected = PNGPacketKeyword() + std::string(2, '\0');
   unsigned char head[8];
   if (::pread(fd, head, sizeof head, 0) != 8 || std::memcmp(head, kSignature, 8) != 0) return false;
   for (off_t pos = 8; pos + 12 <= size;) {
     if (::pread(fd, head, sizeof head, pos) != 8) break;
     const off_t length = (off_t(head[0]) << 24) | (off_t(head[1]) << 16) | (off_t(head[2]) << 8) | off_t(head[3]);
     if (pos + 12 + length > size) break;
-    char start[sizeof kStart];
-    if (std::memcmp(head + 4, "iTXt", 4) == 0 && length >= off_t(sizeof start) &&
-        ::pread(fd, start, sizeof start, pos + 8) == off_t(sizeof start) &&
-        std::memcmp(start, kStart, sizeof start) == 0) {
+    std::string start(expected.size(), '\0');
+    if (std::memcmp(head + 4, "iTXt", 4) == 0 && length >= off_t(start.size()) &&
+        ::pread(fd, start.data(), start.size(), pos + 8) == off_t(start.size()) && start == expected) {
       *begin = pos;
       *end = pos + 12 + length;
       return true;
@@ -152,7 +166,8 @@ bool WritePNGPacket(const std::string& target, const std::string& packet, unsign
   // iTXt: keyword, no compression, no language, no translated keyword.
   std::string chunk(4, '\0');
   chunk += "iTXt";
-  chunk.append("XML:com.adobe.xmp\0\0\0\0\0", 22);
+  chunk += PNGPacketKeyword();
+  chunk.append(5, '\0');
   chunk += packet;
   const std::uint64_t length = chunk.size() - 8;
   if (length > 0x7FFFFFFFu) {
