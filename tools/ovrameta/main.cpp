@@ -22,7 +22,8 @@ int main(int argc, char** argv) {
       ->check(CLI::Range(1u, ovrameta::kMaxJobs));
   app.footer(
       "Names are prefix:Property, prefix:Struct/prefix:Field or prefix:Array[n].\n"
-      "Exit status: 0 success, 1 a named value is absent, 2 usage error or unreadable file.");
+      "Exit status: 0 success, 1 a named value is absent, 2 usage error or a file that cannot\n"
+      "be read or written.");
 
   std::vector<std::string> showFiles;
   bool each = false;
