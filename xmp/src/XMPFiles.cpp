@@ -93,6 +93,25 @@ bool FindPNGPacketChunk(int fd, off_t size, off_t* begin, off_t* end) {
   return false;
 }
 
+// Writes all of data to out.
+bool WriteAll(int out, const char* data, std::size_t length) {
+  for (std::size_t done = 0; done < length;) {
+    const ssize_t put = ::write(out, data + done, length - done);
+    if (put < 0 && errno != EINTR) return false;
+    if (put > 0) done += static_cast<std::size_t>(put);
+  }
+  return true;
+}
+
+// A new, empty file beside path (same folder, so that a rename replaces the
+// original atomically; same extension, which the handlers look at), under
+// a hidden name stored in name. -1 when it cannot be made.
+int CreateBeside(const fs::path& path, std::string* name) {
+  const std::string ext = path.extension().u8string();
+  *name = (path.parent_path() / ("." + path.filename().u8string() + ".ovra-XXXXXX" + ext)).u8string();
+  return ::mkstemps(name->data(), static_cast<int>(ext.size()));
+}
+
 // Copies the bytes [from, to) of in (to < 0: up to the end) to the end of out.
 bool CopyRange(int in, int out, off_t from, off_t to, char* buffer, std::size_t size) {
   for (off_t at = from; to < 0 || at < to;) {
@@ -101,24 +120,18 @@ bool CopyRange(int in, int out, off_t from, off_t to, char* buffer, std::size_t 
     if (got < 0 && errno == EINTR) continue;
     if (got < 0) return false;
     if (got == 0) return to < 0;
-    for (ssize_t done = 0; done < got;) {
-      const ssize_t put = ::write(out, buffer + done, static_cast<std::size_t>(got - done));
-      if (put < 0 && errno != EINTR) return false;
-      if (put > 0) done += put;
-    }
+    if (!WriteAll(out, buffer, static_cast<std::size_t>(got))) return false;
     at += got;
   }
   return true;
 }
 
-// A copy of the file beside it (same folder, so that a rename replaces the
-// original atomically; same extension, which the handlers look at), with
-// the original's permission bits. Empty when it cannot be made.
+// A copy of the file beside it (see CreateBeside) with the original's
+// permission bits. Empty when it cannot be made.
 std::string CopyBeside(const std::string& target) {
   const fs::path path = PathOf(target);
-  const std::string ext = path.extension().u8string();
-  std::string name = (path.parent_path() / ("." + path.filename().u8string() + ".ovra-XXXXXX" + ext)).u8string();
-  const int out = ::mkstemps(name.data(), static_cast<int>(ext.size()));
+  std::string name;
+  const int out = CreateBeside(path, &name);
   if (out < 0) return std::string();
   bool ok = false;
   const int in = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
@@ -179,21 +192,16 @@ bool WritePNGPacket(const std::string& target, const std::string& packet, unsign
   crc.process_bytes(chunk.data() + 4, chunk.size() - 4);
   for (int i = 0; i < 4; ++i) chunk += static_cast<char>((crc.checksum() >> (24 - 8 * i)) & 0xFF);
 
-  const std::string ext = path.extension().u8string();
-  std::string name = (path.parent_path() / ("." + path.filename().u8string() + ".ovra-XXXXXX" + ext)).u8string();
-  const int out = ::mkstemps(name.data(), static_cast<int>(ext.size()));
+  std::string name;
+  const int out = CreateBeside(path, &name);
   if (out < 0) {
     ::close(in);
     return false;
   }
   const std::size_t size = static_cast<std::size_t>(std::clamp<off_t>(info.st_size, off_t(4096), off_t(1) << 20));
   const std::unique_ptr<char[]> buffer(new char[size]);
-  bool ok = ::fchmod(out, mode) == 0 && CopyRange(in, out, 0, oldBegin, buffer.get(), size);
-  for (std::size_t done = 0; ok && done < chunk.size();) {
-    const ssize_t put = ::write(out, chunk.data() + done, chunk.size() - done);
-    if (put < 0 && errno != EINTR) ok = false;
-    if (put > 0) done += static_cast<std::size_t>(put);
-  }
+  bool ok = ::fchmod(out, mode) == 0 && CopyRange(in, out, 0, oldBegin, buffer.get(), size) &&
+            WriteAll(out, chunk.data(), chunk.size());
   ok = ok && CopyRange(in, out, oldEnd, -1, buffer.get(), size) && ::fsync(out) == 0;
   ::close(in);
   if (::close(out) != 0) ok = false;
