@@ -335,7 +335,8 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
       // PNG packets are written by the layer (see WritePNGPacket): the
       // toolkit only reads the file.
       XMP_OptionBits handler = 0;
-      const XMP_FileFormat targetFormat = CheckFileFormat(target);
+      // target is resolved and known to be a regular file already.
+      const auto targetFormat = static_cast<XMP_FileFormat>(xmp_files_check_file_format(target.c_str()));
       pngWrite = targetFormat == kXMP_PNGFile;
       if (pngWrite) {
         toolkitFlags = (openFlags & ~kXMPFiles_OpenForUpdate) | kXMPFiles_OpenForRead;
