@@ -39,7 +39,10 @@ if [ -z "${OVRAMETA:-}" ]; then
   OVRAMETA=$root/build/tools/ovrameta/ovrameta
 fi
 # The floor program of the same build: build/tools/ovrameta/ovrameta -> build/bench/set_floor.
-FLOOR=${FLOOR:-$(cd "$(dirname "$OVRAMETA")/../.." && pwd)/bench/set_floor}
+if [ -z "${FLOOR:-}" ]; then
+  FLOOR=$(cd "$(dirname "$OVRAMETA")/../.." 2>/dev/null && pwd)/bench/set_floor || true
+fi
+cores=$(nproc 2>/dev/null || echo 2)
 command -v exiftool >/dev/null || { echo "compare.sh: exiftool is missing" >&2; exit 2; }
 
 work=$(mktemp -d "${TMPDIR:-/tmp}/ovra-compare-XXXXXX")
@@ -144,7 +147,7 @@ set_o=$(best_write "$OVRAMETA" set "${files[@]}" xmp:Label=Reviewed)
 set_e=$(best_write exiftool -fast -overwrite_original -XMP-xmp:Label=Reviewed "${files[@]}")
 set_x=$(best_write exiv2 -q -M "set Xmp.xmp.Label Reviewed" mo "${files[@]}")
 set_f=""
-[ -x "$FLOOR" ] && set_f=$(best_write "$FLOOR" "$(nproc 2>/dev/null || echo 2)" "${files[@]}")
+[ -x "$FLOOR" ] && set_f=$(best_write "$FLOOR" "$cores" "${files[@]}")
 
 # ---------------------------------------------------------------- checks
 # Every tool must have done the work, or its speed means nothing.
@@ -168,7 +171,7 @@ echo
 echo "ovrameta wrote the label into $written of $count files; exiv2 read a title from $exiv2_read of $count files."
 if [ -n "$set_f" ]; then
   rm -rf "$work/copy" && cp -a "$work/corpus" "$work/copy"
-  (cd "$work/copy" && "$FLOOR" 2 "${files[@]}" >/dev/null 2>&1) || true
+  (cd "$work/copy" && "$FLOOR" "$cores" "${files[@]}" >/dev/null 2>&1) || true
   floor_written=$(cd "$work/copy" && exiftool -fast -s3 -XMP-xmp:Label "${files[@]}" 2>/dev/null | grep -c '^Reviewed$' || true)
   echo "The toolkit handlers alone wrote the label into $floor_written of $count files (in place, no sync, no aggregate)."
 fi
