@@ -1,5 +1,7 @@
 #include <ovracore/FileSupport.h>
 
+#include <ovracore/SafeWrite.h>
+
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
@@ -59,45 +61,6 @@ fs::path ModuleFolder() {
   std::error_code ec;
   const fs::path exe = fs::read_symlink("/proc/self/exe", ec);
   return ec ? fs::current_path(ec) : exe.parent_path();
-}
-
-// The permission bits a newly created file gets under the process umask,
-// read without changing it (umask(2) has no read-only form).
-mode_t NewFileMode() {
-  mode_t mask = 022;
-  std::ifstream status("/proc/self/status");
-  std::string line;
-  while (std::getline(status, line)) {
-    if (line.compare(0, 6, "Umask:") == 0) {
-      mask = static_cast<mode_t>(std::strtoul(line.c_str() + 6, nullptr, 8));
-      break;
-    }
-  }
-  return static_cast<mode_t>(0666 & ~mask);
-}
-
-bool WriteAll(int fd, std::string_view contents) {
-  const char* data = contents.data();
-  std::size_t left = contents.size();
-  while (left > 0) {
-    const ssize_t written = ::write(fd, data, left);
-    if (written < 0) {
-      if (errno == EINTR) continue;
-      return false;
-    }
-    data += written;
-    left -= static_cast<std::size_t>(written);
-  }
-  return true;
-}
-
-void SyncFolder(const fs::path& folder) {
-  // Makes the rename itself durable; failure only weakens durability, the
-  // file is already complete, so it is not reported.
-  const int fd = ::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-  if (fd < 0) return;
-  ::fsync(fd);
-  ::close(fd);
 }
 
 }  // namespace
@@ -251,32 +214,11 @@ bool SimpleWriteStringToFile(const File& file, std::string_view contents) {
 }
 
 bool SafeSave(const UTF16String& path, std::string_view contents) {
-  fs::path target = ToFSPath(path);
-  if (target.empty() || !target.has_filename()) return false;
-  std::error_code ec;
-  // Saving through a link replaces what it points to, not the link.
-  if (fs::is_symlink(target, ec)) {
-    const fs::path resolved = fs::canonical(target, ec);
-    if (!ec) target = resolved;
-  }
-  const fs::path folder = target.has_parent_path() ? target.parent_path() : fs::path(".");
-
-  std::string name = (folder / ("." + target.filename().string() + ".tmp-XXXXXX")).string();
-  const int fd = ::mkstemp(name.data());
-  if (fd < 0) return false;
-  const fs::path temp(name);
-
-  struct stat existing {};
-  const mode_t mode = ::stat(target.c_str(), &existing) == 0 ? (existing.st_mode & 07777) : NewFileMode();
-  bool ok = ::fchmod(fd, mode) == 0 && WriteAll(fd, contents) && ::fsync(fd) == 0;
-  ok = (::close(fd) == 0) && ok;
-  ok = ok && ::rename(temp.c_str(), target.c_str()) == 0;
-  if (!ok) {
-    ::unlink(temp.c_str());
-    return false;
-  }
-  SyncFolder(folder);
-  return true;
+  FileReplacement replacement;
+  const std::string target = ToUTF8(path);
+  return !target.empty() && replacement.Open(target, true, nullptr) &&
+         replacement.Begin(contents.size(), nullptr) && replacement.Append(contents, nullptr) &&
+         replacement.Commit(nullptr);
 }
 
 }  // namespace filesupport

@@ -228,6 +228,14 @@ class ExpatParser final : public Parser {
   }
 
   UTF8String ErrorMessage() const override { return mError; }
+  std::uint64_t CurrentByteIndex() const override {
+    const XML_Index index = XML_GetCurrentByteIndex(mParser.get());
+    return index < 0 ? 0 : static_cast<std::uint64_t>(index);
+  }
+  std::size_t CurrentByteCount() const override {
+    const int count = XML_GetCurrentByteCount(mParser.get());
+    return count < 0 ? 0 : static_cast<std::size_t>(count);
+  }
 
  private:
   bool Begin() {
@@ -284,6 +292,8 @@ class ExpatParser final : public Parser {
     if (mStopped) return;
     try {
       f();
+    } catch (const ParseAbort& e) {
+      Stop(e.what());
     } catch (const std::exception& e) {
       Stop(std::string("handler failed: ") + e.what());
     } catch (...) {

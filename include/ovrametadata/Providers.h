@@ -234,13 +234,19 @@ class OVRAMETADATA_EXPORT FileProvider : public TypicalProviderImpl {
   // Reads the file's XMP again and notifies. A file that cannot be opened
   // or has no XMP gives no metadata; nothing is reported.
   void ReloadFile();
-  // Writes the whole packet into the file (the list is not consulted).
-  // Does nothing without metadata or while XMP writing is disabled; a
-  // failure is dropped and leaves the file as it was.
+  // Writes the packet into the file (the list is not consulted): what
+  // changed since the file was read goes into the packet the file holds
+  // now, and nothing else in the file changes. Does nothing without
+  // metadata or while XMP writing is disabled; a failure is not reported
+  // and leaves the file byte for byte as it was.
   void WriteChanges(const std::vector<Path>& paths) override;
+  // Why the last write-back left the file as it was, in one line; empty
+  // after one that succeeded or had nothing to write.
+  const UTF16String& LastWriteFailure() const { return mWriteFailure; }
 
  private:
   UTF16String mFilePath;
+  UTF16String mWriteFailure;
 };
 
 // One packet over several providers: differing values are marked as

@@ -96,6 +96,7 @@ void FileProvider::ReloadFile() {
 }
 
 void FileProvider::WriteChanges(const std::vector<Path>& /*paths*/) {
+  mWriteFailure.clear();
   const XMPMetaRef xmp = MetaDataAccess();
   if (!xmp || IsXMPWritingDisabled()) return;
   try {
@@ -104,9 +105,12 @@ void FileProvider::WriteChanges(const std::vector<Path>& /*paths*/) {
                            kUpdateOpenFlags);
     file.PutXMP(meta);
     file.CloseFile(ovraxmp::kXMPFiles_NoOptions);
+  } catch (const std::exception& e) {
+    // Write-back must not throw; the layer leaves the file as it was when
+    // opening or writing fails, and the reason is kept for the host.
+    mWriteFailure = ovracore::ToUTF16(e.what());
   } catch (...) {
-    // Write-back must not throw; the toolkit leaves the file as it was when
-    // opening or writing fails.
+    mWriteFailure = u"unknown failure";
   }
 }
 

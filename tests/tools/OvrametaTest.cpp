@@ -402,12 +402,12 @@ TEST_F(OvrametaTest, ExifToolReadsWhatOvrametaWrote) {
                  "dc:subject=north; south"}).status,
             0);
   ASSERT_EQ(Run({"set", "interview.mp4", "xmpDM:scene=7", "xmpDM:good=False"}).status, 0);
-  // The camera data stays, in its native EXIF form, and the legacy IPTC
-  // title follows the XMP one.
+  // The camera data stays in its native EXIF form; the IPTC record is left
+  // as it was.
   const std::tuple<fs::path, const char*, const char*> tags[] = {
       {photo, "XMP-dc:Title", "Written by ovrameta"}, {photo, "XMP-xmp:Rating", "2"},
       {photo, "XMP-dc:Subject", "north, south"},      {photo, "EXIF:ExposureTime", "1/250"},
-      {photo, "IPTC:ObjectName", "Written by ovrameta"}, {clip, "XMP-xmpDM:Scene", "7"},
+      {photo, "IPTC:ObjectName", "Harbour at dawn"}, {clip, "XMP-xmpDM:Scene", "7"},
       {clip, "XMP-xmpDM:Good", "False"},              {clip, "XMP-xmpDM:ShotName", "Pier wide"}};
   for (const auto& [file, tag, value] : tags) EXPECT_EQ(ExifToolValue(file, tag), value) << tag;
 }

@@ -129,20 +129,12 @@ class BatchedFileProvider : public FileProvider {
   }
 
   // Writes what the last write-backs asked for; nothing when none did.
-  // False when the file was to be written and was left as it was: the
-  // library drops a failed write without a word, and a written file has a
-  // new inode or a new modification time.
-  bool Flush() {
-    if (!mHasPending) return true;
+  // The reason when the file was to be written and was left as it was.
+  std::string Flush() {
+    if (!mHasPending) return std::string();
     mHasPending = false;
-    const std::string path = ToUTF8(FilePath());
-    struct stat before {};
-    const bool known = ::stat(path.c_str(), &before) == 0;
     FileProvider::WriteChanges(std::exchange(mPending, std::vector<Path>()));
-    struct stat after {};
-    if (!known || ::stat(path.c_str(), &after) != 0) return false;
-    return after.st_ino != before.st_ino || after.st_mtim.tv_sec != before.st_mtim.tv_sec ||
-           after.st_mtim.tv_nsec != before.st_mtim.tv_nsec || after.st_size != before.st_size;
+    return ToUTF8(LastWriteFailure());
   }
 
  private:
@@ -696,9 +688,8 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
   ForEachInOrder(
       opened.size(), Jobs(),
       [&](std::size_t i) {
-        if (!opened[i].batched->Flush() && !IsXMPWritingDisabled()) {
-          notes[i].Error(opened[i].name, "cannot write file: it was left as it was", kExitUsage);
-        }
+        const std::string failure = opened[i].batched->Flush();
+        if (!failure.empty()) notes[i].Error(opened[i].name, "cannot write file: " + failure, kExitUsage);
         notes[i].FlushLibrary(opened[i].name);
       },
       [&](std::size_t i) {

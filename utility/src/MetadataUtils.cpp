@@ -76,7 +76,7 @@ XMP_FileFormat DetectFormat(const UTF16String& path) {
     ++sDetectionOpenCount;
     ovraxmp::XMPFiles file(ovracore::ToUTF8(path), kUnknownFormat, kDetectionOpenFlags);
     XMP_FileFormat format = kUnknownFormat;
-    file.GetFileInfo(nullptr, nullptr, &format, nullptr);
+    file.GetFileInfo(nullptr, nullptr, &format);
     file.CloseFile(ovraxmp::kXMPFiles_NoOptions);
     return format;
   } catch (const ovraxmp::XMP_Error&) {

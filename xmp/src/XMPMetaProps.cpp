@@ -8,7 +8,7 @@
 #include <ovraxmp/XMPUtils.h>
 
 #include "XMPPacket.h"
-#include "XMPScan.h"
+#include "files/PacketScan.h"
 
 namespace ovraxmp {
 namespace {
@@ -16,6 +16,13 @@ namespace {
 using detail::XmpString;
 
 XmpPtr X(XMPMetaRef ref) { return detail::Require(ref).Xmp(); }
+
+// The packet about to change.
+XmpPtr W(XMPMetaRef ref) {
+  XMPPacket& packet = detail::Require(ref);
+  packet.BeforeChange();
+  return packet.Xmp();
+}
 
 [[noreturn]] void Fail(const std::string& what, const std::string& ns, const std::string& path) {
   detail::ThrowLastError(kXMPErr_InternalFailure, what + " \"" + path + "\" in \"" + ns + "\"");
@@ -192,6 +199,16 @@ XmpPtr DeepCopy(XmpPtr xmp) {
 }
 }  // namespace detail
 
+void XMPPacket::BeforeChange() {
+  if (mFromFile && !mBaseline) mBaseline = detail::DeepCopy(mXmp);
+}
+
+void XMPPacket::CopyOriginFrom(const XMPPacket& other) {
+  MarkFromFile();
+  mFromFile = other.mFromFile;
+  if (other.mBaseline) mBaseline = detail::DeepCopy(other.mBaseline);
+}
+
 // ---- whole packet ----
 
 void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_OptionBits options) {
@@ -212,11 +229,10 @@ void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_Option
     // properties linearly: absurd nesting or property counts are refused
     // first (malformed XML too, which it would refuse after complaining on
     // stderr).
-    try {
-      detail::RequireSanePacket(buffer, length);
-    } catch (...) {
+    std::string problem;
+    if (!detail::ScanPacket(std::string_view(buffer, length), &problem)) {
       xmp_free(fresh);
-      throw;
+      detail::Throw(kXMPErr_BadXML, "parsing XMP: " + problem);
     }
     ok = xmp_parse(fresh, buffer, length);
   }
@@ -225,6 +241,7 @@ void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_Option
     xmp_free(fresh);
     detail::Throw(id != 0 ? id : kXMPErr_BadParse, "parsing XMP");
   }
+  packet.BeforeChange();
   packet.ReplaceXmp(fresh);
   packet.Marks().clear();
 }
@@ -266,6 +283,7 @@ XMPMeta XMPMeta::Clone(XMP_OptionBits) const {
   XmpPtr copy = detail::DeepCopy(packet.Xmp());
   XMPPacket* clone = detail::NewPacket(copy);
   clone->Marks() = packet.Marks();
+  clone->CopyOriginFrom(packet);
   XMPMeta result(clone);
   XMPMetaRefRelease(clone);
   return result;
@@ -275,6 +293,7 @@ void XMPMeta::Erase() {
   XMPPacket& packet = detail::Require(mRef);
   XmpPtr fresh = xmp_new_empty();
   if (!fresh) detail::ThrowLastError(kXMPErr_NoMemory, "creating an XMP packet");
+  packet.BeforeChange();
   packet.ReplaceXmp(fresh);
   packet.Marks().clear();
 }
@@ -310,7 +329,7 @@ void XMPMeta::SetProperty(const std::string& nsIn, const std::string& nameIn, co
   const bool aliased = ResolveArrayAlias(nsIn, nameIn, true, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
   const std::string& name = aliased ? aliasPath : nameIn;
-  XmpPtr xmp = X(mRef);
+  XmpPtr xmp = W(mRef);
   detail::RequirePrefix(ns);
   options = WithImpliedBits(options);
   XMP_OptionBits existing = 0;
@@ -328,7 +347,7 @@ void XMPMeta::DeleteProperty(const std::string& nsIn, const std::string& nameIn)
   const bool aliased = ResolveArrayAlias(nsIn, nameIn, true, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
   const std::string& name = aliased ? aliasPath : nameIn;
-  XmpPtr xmp = X(mRef);
+  XmpPtr xmp = W(mRef);
   if (!detail::NamespaceKnown(ns)) return;
   char missing = 0;
   CheckAncestors(xmp, ns, name, &missing);
@@ -451,7 +470,7 @@ void XMPMeta::SetArrayItem(const std::string& nsIn, const std::string& arrayName
   const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
   const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
-  XmpPtr xmp = X(mRef);
+  XmpPtr xmp = W(mRef);
   detail::RequirePrefix(ns);
   CheckIndex(index);
   bool exists = false;
@@ -482,7 +501,7 @@ void XMPMeta::AppendArrayItem(const std::string& nsIn, const std::string& arrayN
   const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
   const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
-  XmpPtr xmp = X(mRef);
+  XmpPtr xmp = W(mRef);
   detail::RequirePrefix(ns);
   arrayOptions = WithImpliedBits(arrayOptions);
   options = WithImpliedBits(options);
@@ -662,7 +681,7 @@ void XMPMeta::SetLocalizedText(const std::string& nsIn, const std::string& altTe
   const bool aliased = ResolveArrayAlias(nsIn, altTextNameIn, false, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
   const std::string& altTextName = aliased ? aliasPath : altTextNameIn;
-  XmpPtr xmp = X(mRef);
+  XmpPtr xmp = W(mRef);
   detail::RequirePrefix(ns);
   if (specificLang.empty()) detail::Throw(kXMPErr_BadParam, "empty specific language");
   XMP_OptionBits form = 0;
@@ -679,7 +698,7 @@ void XMPMeta::DeleteLocalizedText(const std::string& nsIn, const std::string& al
   const bool aliased = ResolveArrayAlias(nsIn, altTextNameIn, false, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
   const std::string& altTextName = aliased ? aliasPath : altTextNameIn;
-  XmpPtr xmp = X(mRef);
+  XmpPtr xmp = W(mRef);
   XMP_OptionBits form = 0;
   if (!NodeOptions(xmp, ns, altTextName, &form) || !(form & kXMP_PropArrayIsAlternate)) return;
   std::string lang;

@@ -7,6 +7,7 @@
 #include <map>
 #include <set>
 #include <string>
+#include <utility>
 
 #include <exempi/xmp.h>
 
@@ -22,6 +23,7 @@ class XMPPacket {
   explicit XMPPacket(XmpPtr xmp) noexcept : mXmp(xmp) {}
   ~XMPPacket() {
     if (mXmp) xmp_free(mXmp);
+    if (mBaseline) xmp_free(mBaseline);
   }
   XMPPacket(const XMPPacket&) = delete;
   XMPPacket& operator=(const XMPPacket&) = delete;
@@ -32,6 +34,9 @@ class XMPPacket {
     if (mXmp) xmp_free(mXmp);
     mXmp = xmp;
   }
+  // Hands the toolkit object over; the packet is left empty-handed and may
+  // only be destroyed.
+  XmpPtr Detach() noexcept { return std::exchange(mXmp, nullptr); }
   void AddRef() noexcept { mRefCount.fetch_add(1, std::memory_order_relaxed); }
   // True when this was the last reference (the caller deletes the packet).
   bool Release() noexcept { return mRefCount.fetch_sub(1, std::memory_order_acq_rel) == 1; }
@@ -39,6 +44,20 @@ class XMPPacket {
 
   std::map<std::string, std::set<std::string>>& Marks() { return mMarks; }
   const std::map<std::string, std::set<std::string>>& Marks() const { return mMarks; }
+
+  // A packet handed out by a file remembers what it was at its first change
+  // since, so that a write carries only the changes (see XMPFiles).
+  void MarkFromFile() noexcept {
+    mFromFile = true;
+    if (mBaseline) xmp_free(mBaseline);
+    mBaseline = nullptr;
+  }
+  bool FromFile() const noexcept { return mFromFile; }
+  // Every change of the content goes through here first.
+  void BeforeChange();
+  // The content as handed out; null while it has not changed.
+  XmpPtr Baseline() const noexcept { return mBaseline; }
+  void CopyOriginFrom(const XMPPacket& other);
 
   // The namespace last found registered for this packet (reads repeat it);
   // valid while its generation is the registry's.
@@ -49,6 +68,8 @@ class XMPPacket {
   XmpPtr mXmp;
   std::atomic<std::int32_t> mRefCount{1};
   std::map<std::string, std::set<std::string>> mMarks;
+  bool mFromFile = false;
+  XmpPtr mBaseline = nullptr;
 };
 
 namespace detail {

@@ -18,7 +18,6 @@ int sInitializationCount = 0;
 int sFilesInitializationCount = 0;
 std::atomic<bool> sToolkitUp{false};
 std::string sClientName;
-std::string sPluginFolder;
 XMP_AssertNotifyProc sAssertProc = nullptr;
 void* sAssertRefCon = nullptr;
 
@@ -146,10 +145,10 @@ std::string XMPMeta::GetVersionInfo() {
   return text.substr(start + key.size(), end - start - key.size());
 }
 
-bool XMPFiles::Initialize(const std::string& pluginFolder) {
+bool XMPFiles::Initialize(const std::string&) {
   XMPMeta::Initialize();
   std::lock_guard<std::mutex> lock(sStateMutex);
-  if (sFilesInitializationCount++ == 0) sPluginFolder = pluginFolder;
+  ++sFilesInitializationCount;
   return true;
 }
 
@@ -157,14 +156,9 @@ void XMPFiles::Terminate() {
   {
     std::lock_guard<std::mutex> lock(sStateMutex);
     if (sFilesInitializationCount == 0) return;
-    if (--sFilesInitializationCount == 0) sPluginFolder.clear();
+    --sFilesInitializationCount;
   }
   XMPMeta::Terminate();
-}
-
-std::string XMPFiles::GetPluginFolder() {
-  std::lock_guard<std::mutex> lock(sStateMutex);
-  return sPluginFolder;
 }
 
 }  // namespace ovraxmp

@@ -2,9 +2,11 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <forward_list>
 #include <memory>
 #include <optional>
+#include <stdexcept>
 #include <string_view>
 #include <utility>
 #include <vector>
@@ -55,6 +57,13 @@ class Attributes {
   std::forward_list<UTF8String> mTexts;
 };
 
+// Thrown by a handler to end the parse: the parse fails with the message as
+// it stands (other exceptions are reported as a failed handler).
+class ParseAbort : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
 // Handlers derive from this class and override what they need. Elements
 // without a namespace are passed by the default StartElement/EndElement on
 // to StartElementNoNamespace/EndElementNoNamespace.
@@ -90,6 +99,11 @@ class Parser {
   bool ParseBuffer(std::string_view text) { return ParseBuffer(text.data(), text.size()); }
   virtual bool ParseFile(const UTF16String& path) = 0;
   virtual UTF8String ErrorMessage() const = 0;
+  // Where the event being delivered lies in the input: the byte offset of
+  // its first byte and its length (a start tag, an end tag; 0 for the end
+  // of an empty-element tag). Valid only inside a handler's call.
+  virtual std::uint64_t CurrentByteIndex() const = 0;
+  virtual std::size_t CurrentByteCount() const = 0;
 };
 
 // The handler must outlive the parser.
