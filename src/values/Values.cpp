@@ -429,7 +429,20 @@ bool SetValue(XMPMetaRef xmp, const Path& path, double value) {
 bool SetValue(XMPMetaRef xmp, const Path& path, const UTF8String& value) {
   const auto entry = PathEntryDefinition(path);
   if (!entry) return false;
-  if (IsDateEntry(*entry)) return WriteValue(xmp, path, value, DateText());
+  if (IsDateEntry(*entry)) {
+    // Compared and verified in the toolkit's normal form, which is what is
+    // stored ("2024-05-01T14:30:00" is kept as "2024-05-01T14:30").
+    UTF8String normal;
+    try {
+      ovraxmp::XMP_DateTime dateTime;
+      XMPUtils::ConvertToDate(value, &dateTime);
+      XMPUtils::ConvertFromDate(dateTime, &normal);
+    } catch (const std::exception&) {
+      ReportInvalidData(kErrorWritingXMP, path);
+      return false;
+    }
+    return WriteValue(xmp, path, normal, DateText());
+  }
   const auto primitive = detail::PrimitiveTypeOfEntry(*entry);
   if (!xmp || !primitive) return false;
   switch (*primitive) {

@@ -548,6 +548,19 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
 // ---------------------------------------------------------------------------
 // set
 
+// The first array item named in name ("dc:subject[9]" in
+// "dc:subject[9]", "xmpDM:markers[2]" in "xmpDM:markers[2]/xmpDM:name")
+// that the packet does not hold; empty when every one exists.
+std::string MissingArrayItem(XMPMetaRef xmp, const std::string& name) {
+  for (std::size_t close = name.find(']'); close != std::string::npos; close = name.find(']', close + 1)) {
+    ResolvedName item;
+    std::string error;
+    if (ResolveName(name.substr(0, close + 1), item, error) && !HasValue(xmp, item.path))
+      return name.substr(0, close + 1);
+  }
+  return std::string();
+}
+
 int SetCommand(const std::vector<std::string>& arguments, const std::vector<std::string>& deletes) {
   Reporter reporter;
   std::vector<std::string> files;
@@ -600,6 +613,8 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
     return reporter.status();
   }
 
+  // A file that cannot be read is named and left out; the others are
+  // written all the same.
   Progress progress(files.size(), "files read");
   reporter.SetProgress(&progress);
   std::vector<OpenedFile> opened;
@@ -608,16 +623,7 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
                                                      {OpenedFile(), Reporter::Buffered()});
     ForEachInOrder(
         files.size(), Jobs(),
-        [&](std::size_t i) {
-          const std::string& name = files[i];
-          OpenedFile& file = read[i].first;
-          if (!OpenFile(name, read[i].second, file, true)) return;
-          if (access(name.c_str(), W_OK) != 0) {
-            read[i].second.Error(name, std::string("cannot write file: ") + std::strerror(errno),
-                                 kExitUsage);
-            file = OpenedFile();
-          }
-        },
+        [&](std::size_t i) { OpenFile(files[i], read[i].second, read[i].first, true); },
         [&](std::size_t i) {
           reporter.Relay(read[i].second);
           if (read[i].first.provider) opened.push_back(std::move(read[i].first));
@@ -626,7 +632,7 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
   }
   progress.Clear();
   reporter.SetProgress(nullptr);
-  if (reporter.status() != kExitSuccess) {
+  if (opened.empty()) {
     std::cerr << "ovrameta: nothing was written" << std::endl;
     return reporter.status();
   }
@@ -655,36 +661,47 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
       reporter.Error(context, "no metadata could be read; nothing was written", kExitUsage);
       return reporter.status();
     }
+    // Every value must go in before any file is written: a change is only
+    // recorded (and so written) when all of them did.
+    const int before = reporter.status();
+    std::vector<Path> changes;
     for (const auto& assignment : assignments) {
-      if (SetValue(xmp, assignment.name.path, assignment.value)) {
-        update.AddChange(assignment.name.path);
+      const std::string missing = MissingArrayItem(xmp, assignment.name.name);
+      if (!missing.empty()) {
+        reporter.Error(context, assignment.name.name + ": " + missing + " does not exist", kExitUsage);
         continue;
       }
-      // Not written: either the value is already there, or the library
-      // could not write it.
-      UTF8String current;
-      if (!GetValue(xmp, assignment.name.path, current) || current != assignment.value) {
-        reporter.Error(context, assignment.name.name + ": the value could not be written",
-                       kExitUsage);
+      // The library reports a value it could not write, or that did not
+      // read back as written; a value already there is not written again.
+      const std::size_t reports = GetErrorInfos().size();
+      if (SetValue(xmp, assignment.name.path, assignment.value)) changes.push_back(assignment.name.path);
+      if (GetErrorInfos().size() != reports) {
+        reporter.Error(context, assignment.name.name + ": the value could not be written", kExitUsage);
       }
     }
     for (const auto& name : deletions) {
       if (DeleteValue(xmp, name.path)) {
-        update.AddChange(name.path);
+        changes.push_back(name.path);
       } else {
         reporter.Error(context, name.name + ": no value to delete", kExitAbsent);
       }
     }
     reporter.FlushLibrary(context);
+    if (reporter.status() != before) {
+      std::cerr << "ovrameta: nothing was written" << std::endl;
+      return reporter.status();
+    }
+    for (const Path& path : changes) update.AddChange(path);
   }
   reporter.FlushLibrary(context);
   target.reset();
 
   // The edit is complete in every file's packet: the files are written side
   // by side.
-  Progress written(opened.size(), "files written");
-  reporter.SetProgress(&written);
+  Progress progressWritten(opened.size(), "files written");
+  reporter.SetProgress(&progressWritten);
   std::vector<Reporter> notes(opened.size(), Reporter::Buffered());
+  std::size_t failed = files.size() - opened.size();
   ForEachInOrder(
       opened.size(), Jobs(),
       [&](std::size_t i) {
@@ -693,11 +710,17 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
         notes[i].FlushLibrary(opened[i].name);
       },
       [&](std::size_t i) {
+        if (notes[i].status() == kExitUsage) ++failed;
         reporter.Relay(notes[i]);
-        written.Step();
+        progressWritten.Step();
       });
-  written.Clear();
+  progressWritten.Clear();
   reporter.SetProgress(nullptr);
+  if (failed > 0 || files.size() > 1) {
+    const std::size_t written = files.size() - failed;
+    std::cerr << "ovrameta: " << written << (written == 1 ? " file" : " files") << " written, " << failed
+              << " not written" << std::endl;
+  }
   return reporter.status();
 }
 

@@ -3,6 +3,7 @@
 #include <cctype>
 #include <cerrno>
 #include <cmath>
+#include <cstdio>
 #include <cstdlib>
 #include <regex>
 #include <vector>
@@ -40,13 +41,73 @@ bool ParseReal(const std::string& text, double& number) {
   return std::isfinite(number);
 }
 
-bool IsDate(const std::string& text) {
-  // The XMP date forms: a year, a month, a day, a time to the minute,
-  // second or fraction, with an optional zone.
+// A date in XMP form. The XMP forms (a year, a month, a day, a time to the
+// minute, second or fraction, an optional zone) are kept; the EXIF form
+// "2024:05:01 14:30:00" and a blank instead of "T" are converted.
+bool ToXMPDate(std::string& text) {
   static const std::regex kDate(
-      "[0-9]{4}(-[0-9]{2}(-[0-9]{2}(T[0-9]{2}:[0-9]{2}(:[0-9]{2}(\\.[0-9]+)?)?"
+      "([0-9]{4})(?:([-:])([0-9]{2})(?:\\2([0-9]{2})(?:[T ]([0-9]{2}:[0-9]{2}(?::[0-9]{2}(?:\\.[0-9]+)?)?)"
       "(Z|[+-][0-9]{2}:[0-9]{2})?)?)?)?");
-  return std::regex_match(text, kDate);
+  std::smatch m;
+  if (!std::regex_match(text, m, kDate)) return false;
+  std::string date = m[1];
+  if (m[3].matched) date += "-" + m[3].str();
+  if (m[4].matched) date += "-" + m[4].str();
+  if (m[5].matched) date += "T" + m[5].str() + m[6].str();
+  text = date;
+  return true;
+}
+
+// A rational in XMP form: "1/250" as it is, a decimal number as a fraction
+// ("2.8" becomes "28/10").
+bool ToXMPRational(std::string& text) {
+  static const std::regex kFraction("[+-]?[0-9]+/[0-9]+");
+  static const std::regex kDecimal("([+-]?)([0-9]+)(?:\\.([0-9]{1,9}))?");
+  std::smatch m;
+  if (std::regex_match(text, kFraction)) return text.substr(text.find('/') + 1).find_first_not_of('0') != std::string::npos;
+  if (!std::regex_match(text, m, kDecimal)) return false;
+  const std::string fraction = m[3];
+  std::string numerator = m[2].str() + fraction;
+  numerator.erase(0, std::min(numerator.find_first_not_of('0'), numerator.size() - 1));
+  text = m[1].str() + numerator + "/1" + std::string(fraction.size(), '0');
+  return true;
+}
+
+// A GPS coordinate in XMP form ("48,51.5034N"), from decimal degrees
+// ("48.8584", "-33.8568"), degrees, minutes and seconds ("48 51 30.2 N",
+// 48° 51' 30.20" N) or the XMP forms.
+bool ToXMPCoordinate(std::string& text, bool latitude) {
+  static const std::regex kDecimal("([+-]?)([0-9]+(?:\\.[0-9]+)?)");
+  static const std::regex kParts(
+      "([0-9]+(?:\\.[0-9]+)?)(?:\\s*[°,]\\s*|\\s+)([0-9]+(?:\\.[0-9]+)?)?(?:\\s*['′,]\\s*|\\s+)?"
+      "([0-9]+(?:\\.[0-9]+)?)?(?:\\s*(?:\"|″|'')\\s*|\\s*)([NSEWnsew])");
+  std::smatch m;
+  double degrees = 0;
+  char hemisphere = 0;
+  if (std::regex_match(text, m, kDecimal)) {
+    degrees = std::strtod(m[2].str().c_str(), nullptr);
+    hemisphere = latitude ? (m[1] == "-" ? 'S' : 'N') : (m[1] == "-" ? 'W' : 'E');
+  } else if (std::regex_match(text, m, kParts)) {
+    degrees = std::strtod(m[1].str().c_str(), nullptr);
+    if (m[2].matched) degrees += std::strtod(m[2].str().c_str(), nullptr) / 60.0;
+    if (m[3].matched) degrees += std::strtod(m[3].str().c_str(), nullptr) / 3600.0;
+    hemisphere = static_cast<char>(std::toupper(static_cast<unsigned char>(m[4].str()[0])));
+    if ((hemisphere == 'N' || hemisphere == 'S') != latitude) return false;
+  } else {
+    return false;
+  }
+  if (degrees > (latitude ? 90.0 : 180.0)) return false;
+  const int whole = static_cast<int>(degrees);
+  char buffer[48];
+  std::snprintf(buffer, sizeof buffer, "%d,%.6f%c", whole, (degrees - whole) * 60.0, hemisphere);
+  std::string minutes = buffer;
+  // Trailing zeros of the minutes say nothing.
+  const std::size_t dot = minutes.find('.');
+  std::size_t last = minutes.size() - 2;
+  while (last > dot && minutes[last] == '0') --last;
+  if (last == dot) --last;
+  text = minutes.substr(0, last + 1) + hemisphere;
+  return true;
 }
 
 std::string ChoiceList(const EntryDefinition& entry) {
@@ -121,13 +182,24 @@ std::string CheckScalar(PrimitiveType kind, const EntryDefinition& entry, std::s
 }  // namespace
 
 std::string CheckValue(const Path& path, const EntryDefinition& entry, std::string& value) {
-  if (entry.type && *entry.type == "date") {
-    if (!IsDate(value)) {
-      return Quoted(value) + " is not a date (YYYY-MM-DD, optionally with a time: "
-                             "YYYY-MM-DDThh:mm:ss and a zone)";
-    }
-    return std::string();
+  const std::string type = entry.type ? *entry.type : std::string();
+  if (type == "date" && !ToXMPDate(value)) {
+    return Quoted(value) + " is not a date (2024-05-01, 2024-05-01T14:30:00, 2024:05:01 14:30:00; "
+                           "a zone such as +02:00 or Z may follow the time)";
   }
+  if (type == "rational" && !ToXMPRational(value)) {
+    return Quoted(value) + " is not a rational number (a fraction such as 1/250 or a decimal such as 2.8)";
+  }
+  if (type == "gpscoordinate") {
+    const bool latitude = entry.name.find("Latitude") != std::string::npos;
+    if (!ToXMPCoordinate(value, latitude)) {
+      return Quoted(value) + " is not a " + (latitude ? "latitude" : "longitude") +
+             " (decimal degrees such as " + (latitude ? "48.8584 or -33.8568" : "2.2945 or -70.67") +
+             ", degrees, minutes and seconds such as " + (latitude ? "48 51 30.2 N" : "2 17 40.2 E") +
+             ", or the XMP form " + (latitude ? "48,51.504N" : "2,17.67E") + ")";
+    }
+  }
+  if (type == "date" || type == "rational" || type == "gpscoordinate") return std::string();
   const auto primitive = PrimitiveTypeOfPath(path);
   if (!primitive) return "it is a structure: set its fields (prefix:Struct/prefix:Field)";
   if (*primitive == kPrimitiveType_bag || *primitive == kPrimitiveType_seq) {
