@@ -14,83 +14,12 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
-#include "../providers/MediaFiles.h"
-#include "TestSupport.h"
-
-#ifndef OVRAMETA_EXE
-#error "OVRAMETA_EXE must name the built ovrameta program"
-#endif
-#ifndef OVRA_SAMPLES_DIR
-#error "OVRA_SAMPLES_DIR must name the samples folder"
-#endif
+#include "ToolTestSupport.h"
 
 namespace {
 
-namespace fs = std::filesystem;
-using ovratest::ReadFile;
-using ovratest::TempDir;
-using ovratest::WriteFile;
-using ovratest::media::ExifToolValue;
-using ovratest::media::HaveExifTool;
-using ovratest::media::RunCommand;
-
-struct Result {
-  int status = -1;
-  std::string out;
-  std::string err;
-};
-
-std::string Quote(const std::string& text) {
-  std::string quoted = "'";
-  for (char c : text) quoted += c == '\'' ? std::string("'\\''") : std::string(1, c);
-  return quoted + "'";
-}
-
-// Every needle is in the text.
-void ExpectContains(const std::string& text, std::initializer_list<std::string> needles) {
-  for (const auto& needle : needles)
-    EXPECT_NE(text.find(needle), std::string::npos) << "missing: " << needle << "\nin:\n" << text;
-}
-
-class OvrametaTest : public ::testing::Test {
- protected:
-  // A private copy of a sample, under a new name when asked.
-  fs::path Sample(const std::string& name, const std::string& copyName = std::string()) {
-    const fs::path target = mDir / (copyName.empty() ? name : copyName);
-    fs::copy_file(fs::path(OVRA_SAMPLES_DIR) / name, target, fs::copy_options::overwrite_existing);
-    return target;
-  }
-
-  std::string Command(const std::vector<std::string>& arguments) {
-    std::string command = Quote(OVRAMETA_EXE);
-    for (const auto& argument : arguments) command += " " + Quote(argument);
-    return command;
-  }
-  // Runs ovrameta in the temporary folder with the given arguments.
-  Result Run(const std::vector<std::string>& arguments) {
-    const fs::path out = mDir / ".out", err = mDir / ".err";
-    const int raw = std::system(("cd " + Quote(mDir.path().string()) + " && " + Command(arguments) + " >" +
-                                 Quote(out.string()) + " 2>" + Quote(err.string()) + " </dev/null")
-                                    .c_str());
-    Result result{WIFEXITED(raw) ? WEXITSTATUS(raw) : -1, ReadFile(out), ReadFile(err)};
-    fs::remove(out);
-    fs::remove(err);
-    return result;
-  }
-
-  // The display value of one property of one file; empty when absent.
-  std::string Get(const fs::path& file, const std::string& name) {
-    Result result = Run({"get", file.filename().string(), name});
-    while (!result.out.empty() && result.out.back() == '\n') result.out.pop_back();
-    return result.status == 0 ? result.out : std::string();
-  }
-  // Each {file, name, display value}.
-  void ExpectValues(const std::vector<std::array<std::string, 3>>& values) {
-    for (const auto& [file, name, value] : values) EXPECT_EQ(Get(file, name), value) << file << " " << name;
-  }
-
-  TempDir mDir;
-};
+using namespace ovratest::tool;
+using OvrametaTest = ToolTest;
 
 TEST_F(OvrametaTest, ShowPhotoListsCameraGpsAndIptcValuesUnderSchemaLabels) {
   Sample("harbour.jpg");

@@ -148,7 +148,7 @@ detail::Fragment FragmentOf(const XMPMeta& source, const Key& key) {
 
 // Dates the toolkit derives from a movie header that holds none.
 bool IsEmptyDerivedValue(const detail::Node& node) {
-  return !(node.options & kXMP_PropCompositeMask) && node.value.rfind("1904-01-01T00:00:00", 0) == 0;
+  return !(node.options & kXMP_PropCompositeMask) && node.value.rfind("1904-01-01T00:00", 0) == 0;
 }
 
 }  // namespace
@@ -296,7 +296,7 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
   XMPPacket& packet = detail::Require(xmpObj->GetInternalRef());
   packet.ReplaceXmp(detail::Require(shown.GetInternalRef()).Detach());
   packet.Marks().clear();
-  packet.MarkFromFile();
+  packet.TrackChanges();
   return true;
 }
 
@@ -314,7 +314,7 @@ void XMPFiles::PutXMP(const XMPMeta& xmpObj) {
   // packet from elsewhere, its properties over the stored ones.
   std::vector<Key> changed;
   std::set<std::pair<std::string, std::string>> removed;
-  if (packet.FromFile()) {
+  if (packet.Tracked()) {
     if (packet.Baseline()) {
       const XMPMeta before = OwnPacket(detail::DeepCopy(packet.Baseline()));
       changed = Differences(before, xmpObj);

@@ -200,12 +200,12 @@ XmpPtr DeepCopy(XmpPtr xmp) {
 }  // namespace detail
 
 void XMPPacket::BeforeChange() {
-  if (mFromFile && !mBaseline) mBaseline = detail::DeepCopy(mXmp);
+  if (mTracked && !mBaseline) mBaseline = detail::DeepCopy(mXmp);
 }
 
 void XMPPacket::CopyOriginFrom(const XMPPacket& other) {
-  MarkFromFile();
-  mFromFile = other.mFromFile;
+  TrackChanges();
+  mTracked = other.mTracked;
   if (other.mBaseline) mBaseline = detail::DeepCopy(other.mBaseline);
 }
 

@@ -1,5 +1,6 @@
 // Several files seen as one: collecting packets into an aggregate that marks
 // differing values, and distributing an edited aggregate back.
+#include <algorithm>
 #include <map>
 #include <string>
 #include <utility>
@@ -63,9 +64,48 @@ bool HasMarkBelow(const XMPPacket& packet, const std::string& ns, const std::str
   return it != found->second.end() && it->compare(0, normal.size(), normal) == 0;
 }
 
+std::string Language(const detail::Node& item) {
+  for (const detail::Node& qualifier : item.qualifiers)
+    if (qualifier.name == "xml:lang") return qualifier.value;
+  return std::string();
+}
+
+// A language alternative passes on only the languages the edit changed:
+// each member keeps its other languages, which the aggregate holds only
+// from the first member that had the property.
+void DistributeLanguages(const XMPPacket& packet, XMPMeta& member, const std::string& ns, const std::string& path,
+                         const detail::Node& node) {
+  if (!packet.Baseline()) return;  // nothing was edited
+  XMPPacket* baseline = detail::NewPacket(detail::DeepCopy(packet.Baseline()));
+  const XMPMeta before(baseline);
+  XMPMetaRefRelease(baseline);
+  detail::Node old;
+  detail::ReadNode(before, ns, path, &old);
+  XMP_OptionBits options = 0;
+  if (member.GetProperty(ns, path, nullptr, &options) && !(options & kXMP_PropArrayIsAltText)) return;
+  for (const detail::Node& item : node.children) {
+    const std::string language = Language(item);
+    const auto same = std::find_if(old.children.begin(), old.children.end(), [&](const detail::Node& o) {
+      return Language(o) == language && o.value == item.value;
+    });
+    if (!language.empty() && same == old.children.end())
+      member.SetLocalizedText(ns, path, std::string(), language, item.value);
+  }
+  for (const detail::Node& item : old.children) {
+    const std::string language = Language(item);
+    const bool kept = std::any_of(node.children.begin(), node.children.end(),
+                                  [&](const detail::Node& n) { return Language(n) == language; });
+    if (!kept && !language.empty()) member.DeleteLocalizedText(ns, path, std::string(), language);
+  }
+}
+
 void DistributeNode(const XMPMeta& aggregate, const XMPPacket& packet, XMPMeta& member, const std::string& ns,
                     const std::string& path, const detail::Node& node) {
   if (aggregate.IsMultiValued(ns, path)) return;
+  if (node.options & kXMP_PropArrayIsAltText) {
+    DistributeLanguages(packet, member, ns, path, node);
+    return;
+  }
   if (!IsStruct(node) || !HasMarkBelow(packet, ns, path)) {
     detail::WriteNode(member, ns, path, node);
     return;
@@ -94,6 +134,7 @@ void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_O
         detail::WriteNode(target, entry.first.first, entry.first.second, node);
     }
     target.SetProperty(kXMP_NS_Transient, kMultiFileCount, "1");
+    detail::Require(target.GetInternalRef()).TrackChanges();
     return;
   }
   std::int64_t count = 1;
@@ -125,6 +166,7 @@ void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_O
   for (const auto& entry : incoming) {
     if (!have.count(entry.first)) target.SetMultiValued(entry.first.first, entry.first.second);
   }
+  detail::Require(target.GetInternalRef()).TrackChanges();
 }
 
 void XMPUtils::MultiFileDistribute(const XMPMeta& aggregate, XMPMeta* memberPtr, XMP_OptionBits) {

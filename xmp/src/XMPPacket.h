@@ -45,17 +45,19 @@ class XMPPacket {
   std::map<std::string, std::set<std::string>>& Marks() { return mMarks; }
   const std::map<std::string, std::set<std::string>>& Marks() const { return mMarks; }
 
-  // A packet handed out by a file remembers what it was at its first change
-  // since, so that a write carries only the changes (see XMPFiles).
-  void MarkFromFile() noexcept {
-    mFromFile = true;
+  // A tracked packet remembers what it was at its first change since
+  // tracking began, so that only its changes are passed on: a packet handed
+  // out by a file (see XMPFiles), an aggregate of several (see
+  // XMPUtils::MultiFileDistribute).
+  void TrackChanges() noexcept {
+    mTracked = true;
     if (mBaseline) xmp_free(mBaseline);
     mBaseline = nullptr;
   }
-  bool FromFile() const noexcept { return mFromFile; }
+  bool Tracked() const noexcept { return mTracked; }
   // Every change of the content goes through here first.
   void BeforeChange();
-  // The content as handed out; null while it has not changed.
+  // The content when tracking began; null while it has not changed.
   XmpPtr Baseline() const noexcept { return mBaseline; }
   void CopyOriginFrom(const XMPPacket& other);
 
@@ -68,7 +70,7 @@ class XMPPacket {
   XmpPtr mXmp;
   std::atomic<std::int32_t> mRefCount{1};
   std::map<std::string, std::set<std::string>> mMarks;
-  bool mFromFile = false;
+  bool mTracked = false;
   XmpPtr mBaseline = nullptr;
 };
 
