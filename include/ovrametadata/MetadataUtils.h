@@ -42,5 +42,12 @@ OVRAMETADATA_EXPORT void EraseCachedXMPFormat(const UTF16String& path);
 OVRAMETADATA_EXPORT bool GetAssociatedFiles(const UTF16String& path,
                                             std::vector<UTF16String>& files);
 
+// Removes the new files of writes still in progress in this process, which a
+// write that ends normally never leaves behind. Async-signal-safe: meant
+// for the host's SIGINT and SIGTERM handlers, before the process ends. (A
+// write killed outright leaves at most one such hidden file, which the next
+// write into the same folder removes.)
+OVRAMETADATA_EXPORT void RemoveUnfinishedWrites() noexcept;
+
 }  // namespace utility
 }  // namespace ovrametadata

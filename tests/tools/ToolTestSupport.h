@@ -9,6 +9,8 @@
 #include <cstdlib>
 #include <filesystem>
 #include <initializer_list>
+#include <map>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -76,6 +78,40 @@ inline std::vector<nlohmann::json> ExifToolTags(const std::vector<fs::path>& fil
 // them; the same before and after a write that kept the media intact.
 inline std::string DecodedDigest(const fs::path& file) {
   return RunCommand("ffmpeg -v error -i " + Quote(file.string()) + " -map 0 -f framemd5 - 2>&1");
+}
+
+// Tags every write may change: the edit history the library records, the
+// file system's view, and what ExifTool derives from the size or layout of
+// the file (composite values are computed from tags compared one by one).
+inline bool Volatile(const std::string& tag) {
+  static const std::set<std::string> kTags = {
+      "System:FileModifyDate", "System:FileAccessDate", "System:FileInodeChangeDate", "System:FileSize",
+      "XMP-xmpMM:History",     "XMP-xmpMM:InstanceID",  "XMP-xmpMM:DocumentID",       "XMP-xmpMM:OriginalDocumentID",
+      "XMP-xmp:MetadataDate",  "File:ID3Size",          "QuickTime:MediaDataOffset"};
+  return kTags.count(tag) != 0 || tag.rfind("Composite:", 0) == 0;
+}
+
+// Expects every tag of after to be as in before, except the volatile ones
+// and those in changed (tag -> value after; "" when gone).
+inline void ExpectOnlyChanged(const nlohmann::json& before, const nlohmann::json& after,
+                              const std::map<std::string, std::string>& changed, const std::string& file) {
+  ASSERT_TRUE(before.is_object() && after.is_object()) << file << ": ExifTool read nothing";
+  const auto text = [](const nlohmann::json& tags, const std::string& tag) {
+    if (!tags.contains(tag)) return std::string();
+    return tags[tag].is_string() ? tags[tag].get<std::string>() : tags[tag].dump();
+  };
+  std::set<std::string> tags;
+  for (const auto& item : before.items()) tags.insert(item.key());
+  for (const auto& item : after.items()) tags.insert(item.key());
+  for (const std::string& tag : tags) {
+    if (Volatile(tag) || tag == "SourceFile") continue;
+    const auto asked = changed.find(tag);
+    if (asked != changed.end()) {
+      EXPECT_EQ(text(after, tag), asked->second) << file << " " << tag;
+    } else {
+      EXPECT_EQ(text(after, tag), text(before, tag)) << file << " " << tag << " changed";
+    }
+  }
 }
 
 class ToolTest : public ::testing::Test {

@@ -1,15 +1,30 @@
 // ovrameta: shows and edits the XMP metadata of media files through
 // ovrametadata, the way a host application does.
+#include <csignal>
 #include <iostream>
 #include <string>
 #include <vector>
 
 #include <CLI/CLI.hpp>
+#include <ovrametadata/MetadataUtils.h>
 
 #include "Commands.h"
 #include "Parallel.h"
 
+namespace {
+
+// An interrupted run leaves no half-made file behind: the library removes
+// the new files of writes in progress, then the signal ends the process.
+extern "C" void OnTerminatingSignal(int signal) {
+  ovrametadata::utility::RemoveUnfinishedWrites();
+  std::signal(signal, SIG_DFL);
+  std::raise(signal);
+}
+
+}  // namespace
+
 int main(int argc, char** argv) {
+  for (int signal : {SIGINT, SIGTERM, SIGHUP}) std::signal(signal, OnTerminatingSignal);
   // Output goes through std::cout only.
   std::ios::sync_with_stdio(false);
   CLI::App app{"Shows and edits the XMP metadata of media files."};

@@ -13,12 +13,15 @@
 #include <boost/pool/pool_alloc.hpp>
 
 #include <ovracore/Diagnostics.h>
+#include <ovracore/SafeWrite.h>
 #include <ovracore/FileSupport.h>
 #include <ovracore/Mutex.h>
 #include <ovracore/Strings.h>
 #include <ovraxmp/XMPToolkit.h>
 
 #include "MetadataUtilsInternal.h"
+
+#include <ovracore/SafeWrite.h>
 
 namespace ovrametadata {
 namespace utility {
@@ -124,6 +127,8 @@ void EraseCachedXMPFormat(const UTF16String& path) {
   ovracore::LockGuard<ovracore::RecursiveMutex> lock(sXMPFormatCacheCriticalSection);
   XMPFormatCache().erase(path);
 }
+
+void RemoveUnfinishedWrites() noexcept { ovracore::filesupport::RemoveUnfinishedReplacements(); }
 
 bool GetAssociatedFiles(const UTF16String& path, std::vector<UTF16String>& files) {
   try {

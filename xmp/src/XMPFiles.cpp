@@ -128,7 +128,7 @@ detail::Fragment FragmentOf(const XMPMeta& source, const Key& key) {
   const std::size_t open = text.find('>', description);
   const std::size_t close = text.rfind("</rdf:Description>");
   if (description == std::string::npos || open == std::string::npos || close == std::string::npos || close < open)
-    detail::Throw(kXMPErr_BadSerialize, "writing \"" + key.name + "\"");
+    throw XMP_Error(kXMPErr_BadSerialize, "writing \"" + key.name + "\"");
   const std::string tag = text.substr(description, open - description);
   for (std::size_t at = 0; (at = tag.find("xmlns:", at)) != std::string::npos;) {
     const std::size_t equals = tag.find('=', at);
@@ -212,7 +212,7 @@ XMPFiles::XMPFiles(const std::string& filePath, XMP_FileFormat format, XMP_Optio
 XMPFiles::~XMPFiles() = default;
 
 bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_OptionBits openFlags) {
-  if (mState->open) detail::Throw(kXMPErr_BadObject, "a file is already open");
+  if (mState->open) throw XMP_Error(kXMPErr_BadObject, "a file is already open");
   detail::EnsureStarted();
   *mState = State();
   State& s = *mState;
@@ -248,13 +248,13 @@ bool XMPFiles::GetFileInfo(std::string* filePath, XMP_OptionBits* openFlags, XMP
 
 bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
   State& s = *mState;
-  if (!s.open) detail::Throw(kXMPErr_BadObject, "no file open");
-  if (!xmpObj) detail::Throw(kXMPErr_BadParam, "no XMP object");
+  if (!s.open) throw XMP_Error(kXMPErr_BadObject, "no file open");
+  if (!xmpObj) throw XMP_Error(kXMPErr_BadParam, "no XMP object");
   if (!s.ForUpdate()) {
     const Descriptor fd(::open(s.target.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY));
     struct stat info {};
     if (fd.get() < 0 || ::fstat(fd.get(), &info) != 0)
-      detail::Throw(kXMPErr_ExternalFailure, std::string("cannot read the file: ") + std::strerror(errno));
+      throw XMP_Error(kXMPErr_ExternalFailure, "cannot read the file: " + std::generic_category().message(errno));
     const bool examined = s.Examine(fd.get(), static_cast<std::uint64_t>(info.st_size));
     s.reader.reset();
     if (!examined) return false;
@@ -302,8 +302,8 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
 
 void XMPFiles::PutXMP(const XMPMeta& xmpObj) {
   State& s = *mState;
-  if (!s.open) detail::Throw(kXMPErr_BadObject, "no file open");
-  if (!s.ForUpdate()) detail::Throw(kXMPErr_BadObject, "file not opened for update");
+  if (!s.open) throw XMP_Error(kXMPErr_BadObject, "no file open");
+  if (!s.ForUpdate()) throw XMP_Error(kXMPErr_BadObject, "file not opened for update");
   const XMPPacket& packet = detail::Require(xmpObj.GetInternalRef());
   s.editor.reset();
   s.whole.reset();
@@ -329,7 +329,7 @@ void XMPFiles::PutXMP(const XMPMeta& xmpObj) {
     try {
       expected.ParseFromBuffer(*s.stored);
     } catch (const XMP_Error& e) {
-      detail::Throw(kXMPErr_BadXMP, std::string("its XMP packet cannot be read, so it is left as it is (") +
+      throw XMP_Error(kXMPErr_BadXMP, std::string("its XMP packet cannot be read, so it is left as it is (") +
                                         e.GetErrMsg() + ")");
     }
   }
@@ -414,7 +414,7 @@ void XMPFiles::State::Write() {
       if (auto same = editor->Render(stored->size())) candidates.push_back(std::move(*same));
     }
     if (auto grown = editor->Render(std::nullopt)) candidates.push_back(std::move(*grown));
-    if (candidates.empty()) detail::Throw(kXMPErr_InternalFailure, "the XMP packet could not be edited");
+    if (candidates.empty()) throw XMP_Error(kXMPErr_InternalFailure, "the XMP packet could not be edited");
   } else {
     if (stored && !sidecar) {
       std::string same;
@@ -432,7 +432,7 @@ void XMPFiles::State::Write() {
   if (!wrong.empty()) {
     std::string names;
     for (const std::string& name : wrong) names += (names.empty() ? "" : ", ") + name;
-    detail::Throw(kXMPErr_InternalFailure, "the edited XMP did not read back as written (" + names +
+    throw XMP_Error(kXMPErr_InternalFailure, "the edited XMP did not read back as written (" + names +
                                                "), so the file is left as it is");
   }
 
@@ -452,10 +452,10 @@ void XMPFiles::State::Write() {
       }
     }
   }
-  if (!planned) detail::Throw(kXMPErr_Unimplemented, problem);
+  if (!planned) throw XMP_Error(kXMPErr_Unimplemented, problem);
   if (!replacement->Begin(plan.Size(), &problem) || !plan.Execute(*replacement, &problem) ||
       !replacement->Commit(&problem))
-    detail::Throw(kXMPErr_ExternalFailure, problem);
+    throw XMP_Error(kXMPErr_ExternalFailure, problem);
 }
 
 void XMPFiles::CloseFile(XMP_OptionBits) {
@@ -483,7 +483,7 @@ XMP_FileFormat XMPFiles::CheckFileFormat(const std::string& filePath) {
 
 bool XMPFiles::GetAssociatedResources(const std::string& filePath, std::vector<std::string>* resourceList,
                                       XMP_FileFormat, XMP_OptionBits) {
-  if (!resourceList) detail::Throw(kXMPErr_BadParam, "no resource list");
+  if (!resourceList) throw XMP_Error(kXMPErr_BadParam, "no resource list");
   if (!IsRegularFile(filePath)) return false;
   resourceList->push_back(filePath);
   if (IsSidecarPath(filePath)) return true;
