@@ -362,6 +362,9 @@ bool FileReplacement::Commit(std::string* problem) {
   mPendingSlot = -1;
   ::close(mNew);
   mNew = -1;
+  // Writers waiting for the lock go on, with the file now named.
+  if (mOriginal >= 0) ::close(mOriginal);
+  mOriginal = -1;
   // Makes the rename itself durable.
   const int folder = ::open(mFolder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
   if (folder >= 0) {

@@ -1,13 +1,17 @@
+#include <chrono>
 #include <csignal>
 #include <filesystem>
+#include <future>
 #include <string>
 
 #include <gtest/gtest.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
+#include <sys/xattr.h>
 #include <unistd.h>
 
 #include <ovracore/FileSupport.h>
+#include <ovracore/SafeWrite.h>
 
 #include "TestSupport.h"
 
@@ -22,6 +26,27 @@ UTF16String U(const fs::path& path) { return FromFSPath(path); }
 
 std::size_t EntriesIn(const fs::path& folder) {
   return static_cast<std::size_t>(std::distance(fs::directory_iterator(folder), fs::directory_iterator()));
+}
+
+// Replaces the file with text through a FileReplacement; the problem, or
+// empty when it worked.
+std::string Replace(const fs::path& file, const std::string& text) {
+  FileReplacement replacement;
+  std::string problem;
+  if (replacement.Open(file.string(), false, &problem) && replacement.Begin(text.size(), &problem) &&
+      replacement.Append(text, &problem) && replacement.Commit(&problem))
+    return std::string();
+  return problem;
+}
+
+std::string Command(const std::string& command) {
+  std::string output;
+  if (FILE* pipe = ::popen((command + " 2>/dev/null").c_str(), "r")) {
+    char buffer[512];
+    while (std::fgets(buffer, sizeof buffer, pipe)) output += buffer;
+    ::pclose(pipe);
+  }
+  return output;
 }
 
 }  // namespace
@@ -184,4 +209,72 @@ TEST(DataRoots, PluginsFolderDefaultsBesideModuleAndCanBeSet) {
   EXPECT_EQ(PluginsFolder().FullPath(), u"/opt/host/PlugIns");
   SetPluginsFolder(u"");
   EXPECT_EQ(PluginsFolder().FullPath(), fallback.FullPath());
+}
+
+TEST(FileReplacement, OwnerGroupAndSetIDBitsAreKeptWhereTheProcessMay) {
+  if (::geteuid() != 0) GTEST_SKIP() << "only the superuser may give a file to another user";
+  ovratest::TempDir dir;
+  const fs::path file = dir / "owned.jpg";
+  ovratest::WriteFile(file, "old");
+  ASSERT_EQ(::chown(file.c_str(), 4321, 4322), 0);
+  ASSERT_EQ(::chmod(file.c_str(), 06750), 0);
+  EXPECT_EQ(Replace(file, "new"), "");
+  struct stat info {};
+  ASSERT_EQ(::stat(file.c_str(), &info), 0);
+  EXPECT_EQ(info.st_uid, 4321u);
+  EXPECT_EQ(info.st_gid, 4322u);
+  EXPECT_EQ(info.st_mode & 07777, 06750u);
+}
+
+TEST(FileReplacement, ExtendedAttributesAndAccessListsAreKept) {
+  ovratest::TempDir dir;
+  const fs::path file = dir / "tagged.jpg";
+  ovratest::WriteFile(file, "old");
+  if (::setxattr(file.c_str(), "user.ovra.note", "kept", 4, 0) != 0) GTEST_SKIP() << "no user attributes here";
+  const bool acl = std::system(("setfacl -m u:4321:r " + file.string() + " 2>/dev/null").c_str()) == 0;
+  const std::string before = Command("getfacl -cp " + file.string());
+  const auto mode = fs::status(file).permissions();
+  EXPECT_EQ(Replace(file, "new"), "");
+  char value[16] = {};
+  EXPECT_EQ(::getxattr(file.c_str(), "user.ovra.note", value, sizeof value), 4);
+  EXPECT_STREQ(value, "kept");
+  if (acl) {
+    EXPECT_EQ(Command("getfacl -cp " + file.string()), before);
+  }
+  EXPECT_EQ(fs::status(file).permissions(), mode);
+}
+
+TEST(FileReplacement, AFileMovedAwayWhileItIsWrittenIsNotReplaced) {
+  ovratest::TempDir dir;
+  const fs::path file = dir / "clip.mov";
+  ovratest::WriteFile(file, "old");
+  FileReplacement replacement;
+  std::string problem;
+  ASSERT_TRUE(replacement.Open(file.string(), false, &problem)) << problem;
+  ASSERT_TRUE(replacement.Begin(3, &problem) && replacement.Append("new", &problem)) << problem;
+  fs::rename(file, dir / "elsewhere.mov");
+  EXPECT_FALSE(replacement.Commit(&problem));
+  EXPECT_EQ(problem, "the file was moved or replaced while it was being written");
+  EXPECT_FALSE(fs::exists(file));
+  EXPECT_EQ(ovratest::ReadFile(dir / "elsewhere.mov"), "old");
+  EXPECT_EQ(EntriesIn(dir.path()), 1u);
+}
+
+TEST(FileReplacement, WritersOfOneFileTakeTurnsAndReadWhatTheOtherWrote) {
+  ovratest::TempDir dir;
+  const fs::path file = dir / "shared.xmp";
+  ovratest::WriteFile(file, "old");
+  FileReplacement first;
+  std::string problem;
+  ASSERT_TRUE(first.Open(file.string(), false, &problem)) << problem;
+  auto second = std::async(std::launch::async, [&] {
+    FileReplacement replacement;
+    std::string why;
+    if (!replacement.Open(file.string(), false, &why)) return why;
+    char seen[8] = {};
+    return std::string(seen, static_cast<std::size_t>(::pread(replacement.ReadFD(), seen, sizeof seen, 0)));
+  });
+  EXPECT_EQ(second.wait_for(std::chrono::milliseconds(200)), std::future_status::timeout);
+  ASSERT_TRUE(first.Begin(5, &problem) && first.Append("first", &problem) && first.Commit(&problem)) << problem;
+  EXPECT_EQ(second.get(), "first");
 }

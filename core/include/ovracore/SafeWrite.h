@@ -49,8 +49,9 @@ class FileReplacement {
   bool Append(std::string_view bytes, std::string* problem);
   // Appends the original's bytes [from, to).
   bool AppendOriginal(std::uint64_t from, std::uint64_t to, std::string* problem);
-  // Syncs the new file and renames it over the original. Refused when the
-  // original was renamed away or replaced since Open.
+  // Syncs the new file, renames it over the original and lets the next
+  // writer of the file go on. Refused when the original was renamed away or
+  // replaced since Open.
   bool Commit(std::string* problem);
 
  private:
