@@ -80,6 +80,10 @@ INSTANTIATE_TEST_SUITE_P(
              kEveryContainer,
              {"dc:description=" + kLong},
              {{"XMP-dc:Description", kLong}}},
+        Edit{"APacketLargerThanAJPEGSegmentWasRefused",
+             {"member-b.jpg"},
+             {"dc:description=" + std::string(40000, 'y'), "dc:rights=" + std::string(40000, 'z')},
+             {{"XMP-dc:Description", std::string(40000, 'y')}, {"XMP-dc:Rights", std::string(40000, 'z')}}},
         Edit{"APNGPacketThatShrinks", {"packet.png"}, {"--delete", "dc:description"}, {{"XMP-dc:Description", ""}}},
         Edit{"AThreeFileEditMergedWhatDiffers",
              {"member-a.jpg", "member-b.jpg", "member-c.jpg"},
@@ -116,6 +120,19 @@ TEST_F(WriteRegression, ValuesSetWereNotTheValuesRead) {
   const Result refused = Run({"set", "lang-iptc-digest.jpg", "exif:GPSLatitude=north"});
   EXPECT_EQ(refused.status, 2);
   ExpectContains(refused.err, {"48 51 30.2 N"});
+}
+
+TEST_F(WriteRegression, ExtendedXMPWrittenByExifToolWasLost) {
+  if (!HaveExifTool()) GTEST_SKIP() << "ExifTool is missing; it makes the file";
+  const fs::path file = Medium("member-c.jpg");
+  const std::string big(90000, 'w');
+  RunCommand("exiftool -q -overwrite_original '-XMP-dc:Description=" + big + "' " + Quote(file.string()));
+  const auto before = ExifToolTags({file});
+  ASSERT_TRUE(before[0].contains("XMP-xmpNote:HasExtendedXMP")) << "ExifTool wrote no Extended XMP";
+  EXPECT_EQ(Get(file, "dc:description"), big);
+  ASSERT_EQ(Run({"set", "member-c.jpg", "xmp:Label=Blue", "dc:title=Short"}).status, 0);
+  ExpectOnlyChanged(before[0], ExifToolTags({file})[0], {{"XMP-xmp:Label", "Blue"}, {"XMP-dc:Title", "Short"}},
+                    "member-c.jpg");
 }
 
 TEST_F(WriteRegression, EmptyMovieHeaderDatesWereShownAs1904) {

@@ -87,7 +87,7 @@ inline bool Volatile(const std::string& tag) {
   static const std::set<std::string> kTags = {
       "System:FileModifyDate", "System:FileAccessDate", "System:FileInodeChangeDate", "System:FileSize",
       "XMP-xmpMM:History",     "XMP-xmpMM:InstanceID",  "XMP-xmpMM:DocumentID",       "XMP-xmpMM:OriginalDocumentID",
-      "XMP-xmp:MetadataDate",  "File:ID3Size",          "QuickTime:MediaDataOffset"};
+      "XMP-xmp:MetadataDate",  "File:ID3Size",          "QuickTime:MediaDataOffset",  "XMP-xmpNote:HasExtendedXMP"};
   return kTags.count(tag) != 0 || tag.rfind("Composite:", 0) == 0;
 }
 

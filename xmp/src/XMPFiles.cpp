@@ -22,8 +22,8 @@
 #include "XMPNodeTree.h"
 #include "XMPPacket.h"
 #include "files/Container.h"
-#include "files/PacketEditor.h"
 #include "files/PacketScan.h"
+#include "files/StoredPacket.h"
 
 namespace ovraxmp {
 namespace {
@@ -74,78 +74,6 @@ class Descriptor {
   int mFd;
 };
 
-// A holder of a fresh packet whose only reference it keeps.
-XMPMeta OwnPacket(XmpPtr xmp) {
-  XMPPacket* packet = detail::NewPacket(xmp);
-  XMPMeta meta(packet);
-  XMPMetaRefRelease(packet);
-  return meta;
-}
-
-using Key = detail::TopLevel;  // namespace URI, "prefix:name"
-
-std::string LocalName(const std::string& name) {
-  const std::size_t colon = name.find(':');
-  return colon == std::string::npos ? name : name.substr(colon + 1);
-}
-
-std::vector<Key> Properties(const XMPMeta& meta) {
-  std::vector<Key> keys = detail::TopLevelProperties(meta);
-  keys.erase(std::remove_if(keys.begin(), keys.end(), [](const Key& k) { return k.ns == kXMP_NS_Transient; }),
-             keys.end());
-  return keys;
-}
-
-std::optional<std::string> CanonicalOf(const XMPMeta& meta, const Key& key) {
-  detail::Node node;
-  if (!detail::ReadNode(meta, key.ns, key.name, &node)) return std::nullopt;
-  return detail::Canonical(node);
-}
-
-// The top-level properties that differ between two packets.
-std::vector<Key> Differences(const XMPMeta& before, const XMPMeta& after) {
-  std::vector<Key> keys = Properties(before);
-  for (const Key& key : Properties(after)) {
-    if (std::none_of(keys.begin(), keys.end(), [&](const Key& k) { return k.ns == key.ns && k.name == key.name; }))
-      keys.push_back(key);
-  }
-  std::vector<Key> changed;
-  for (const Key& key : keys)
-    if (CanonicalOf(before, key) != CanonicalOf(after, key)) changed.push_back(key);
-  return changed;
-}
-
-// One property as RDF/XML, written by the toolkit's serialiser.
-detail::Fragment FragmentOf(const XMPMeta& source, const Key& key) {
-  detail::Node node;
-  detail::ReadNode(source, key.ns, key.name, &node);
-  XMPMeta single;
-  detail::WriteNode(single, key.ns, key.name, node);
-  std::string text;
-  single.SerializeToBuffer(&text, kXMP_OmitPacketWrapper);
-  detail::Fragment fragment;
-  const std::size_t description = text.find("<rdf:Description");
-  const std::size_t open = text.find('>', description);
-  const std::size_t close = text.rfind("</rdf:Description>");
-  if (description == std::string::npos || open == std::string::npos || close == std::string::npos || close < open)
-    throw XMP_Error(kXMPErr_BadSerialize, "writing \"" + key.name + "\"");
-  const std::string tag = text.substr(description, open - description);
-  for (std::size_t at = 0; (at = tag.find("xmlns:", at)) != std::string::npos;) {
-    const std::size_t equals = tag.find('=', at);
-    const char quote = tag[equals + 1];
-    const std::size_t end = tag.find(quote, equals + 2);
-    fragment.namespaces.emplace_back(tag.substr(at + 6, equals - at - 6), tag.substr(equals + 2, end - equals - 2));
-    at = end;
-  }
-  fragment.namespaces.emplace_back("rdf", kXMP_NS_RDF);
-  fragment.text = text.substr(open + 1, close - open - 1);
-  const std::size_t first = fragment.text.find('<');
-  const std::size_t lineStart = fragment.text.rfind('\n', first);
-  fragment.text.erase(0, lineStart == std::string::npos ? 0 : lineStart + 1);
-  fragment.text.erase(fragment.text.find_last_not_of(" \t\r\n") + 1);
-  return fragment;
-}
-
 // Dates the toolkit derives from a movie header that holds none.
 bool IsEmptyDerivedValue(const detail::Node& node) {
   return !(node.options & kXMP_PropCompositeMask) && node.value.rfind("1904-01-01T00:00", 0) == 0;
@@ -162,16 +90,13 @@ struct XMPFiles::State {
   std::string refusal;
   mutable std::optional<XMP_FileFormat> format;
 
-  // Update: the original, its layout and what CloseFile writes.
+  // The file's layout and stored XMP; for an update, the original and
+  // whether PutXMP left anything to write.
   std::unique_ptr<FileReplacement> replacement;
   std::unique_ptr<detail::FileReader> reader;
   std::unique_ptr<detail::Container> container;
-  std::optional<std::string> stored;  // the stored packet
-  std::unique_ptr<detail::PacketEditor> editor;
-  std::optional<std::string> whole;   // a packet written whole
-  std::optional<XMPMeta> expected;    // what the written packet must read back as
-  std::vector<Key> changed;
-  std::vector<std::pair<Key, detail::Fragment>> fragments;  // what the editor puts in
+  std::unique_ptr<detail::StoredPacket> stored;
+  bool pending = false;
 
   bool ForUpdate() const { return (openFlags & kXMPFiles_OpenForUpdate) != 0; }
   bool Refuse(std::string why) {
@@ -183,15 +108,18 @@ struct XMPFiles::State {
   bool Examine(int fd, std::uint64_t size) {
     try {
       reader = std::make_unique<detail::FileReader>(fd, size);
+      std::optional<std::string> packet, extension;
       if (sidecar) {
-        stored = reader->ReadText(0, size);
-        if (stored->find_first_not_of(std::string(" \t\r\n\0", 5)) == std::string::npos) stored.reset();
-        return true;
+        packet = reader->ReadText(0, size);
+        if (packet->find_first_not_of(std::string(" \t\r\n\0", 5)) == std::string::npos) packet.reset();
+      } else {
+        container = detail::ContainerFor(*reader);
+        std::string problem;
+        if (!container->Walk(*reader, &problem)) return Refuse(problem);
+        if (container->Packet()) packet = container->PacketText(*reader);
+        extension = container->ExtensionText(*reader);
       }
-      container = detail::ContainerFor(*reader);
-      std::string problem;
-      if (!container->Walk(*reader, &problem)) return Refuse(problem);
-      if (container->Packet()) stored = container->PacketText(*reader);
+      stored = std::make_unique<detail::StoredPacket>(std::move(packet), std::move(extension));
       return true;
     } catch (const detail::IOError& e) {
       return Refuse(SystemText(e));
@@ -199,7 +127,6 @@ struct XMPFiles::State {
   }
 
   void Write();
-  std::vector<std::string> Misread(const std::string& text) const;
 };
 
 XMPFiles::XMPFiles() : mState(std::make_unique<State>()) {}
@@ -262,18 +189,16 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
   if (!s.refusal.empty()) return false;
 
   XMPMeta shown;
-  if (s.stored) {
-    try {
-      shown.ParseFromBuffer(*s.stored);
-    } catch (const XMP_Error&) {
-      // A packet that does not parse is XMP nobody can read, and that no
-      // write may replace.
-      s.refusal = "its XMP packet cannot be read";
-      return false;
-    }
+  try {
+    shown = s.stored->Parsed();
+  } catch (const XMP_Error&) {
+    // A packet that does not parse is XMP nobody can read, and that no
+    // write may replace.
+    s.refusal = "its XMP packet cannot be read";
+    return false;
   }
-  bool any = s.stored.has_value();
-  if (!s.sidecar && (!s.stored || s.container->HasNativeMetadata())) {
+  bool any = s.stored->Exists();
+  if (!s.sidecar && (!s.stored->Exists() || s.container->HasNativeMetadata())) {
     // The handler's view: the stored packet merged with native metadata.
     XmpFilePtr file = xmp_files_open_new(s.target.c_str(), XMP_OPEN_READ);
     if (file) {
@@ -281,8 +206,8 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
       xmp_files_close(file, XMP_CLOSE_NOOPTION);
       xmp_files_free(file);
       if (merged) {
-        const XMPMeta view = OwnPacket(merged);
-        for (const Key& key : Properties(view)) {
+        const XMPMeta view = detail::OwnPacket(merged);
+        for (const detail::Key& key : detail::Properties(view)) {
           if (shown.DoesPropertyExist(key.ns, key.name)) continue;
           detail::Node node;
           if (!detail::ReadNode(view, key.ns, key.name, &node) || IsEmptyDerivedValue(node)) continue;
@@ -305,137 +230,20 @@ void XMPFiles::PutXMP(const XMPMeta& xmpObj) {
   if (!s.open) throw XMP_Error(kXMPErr_BadObject, "no file open");
   if (!s.ForUpdate()) throw XMP_Error(kXMPErr_BadObject, "file not opened for update");
   const XMPPacket& packet = detail::Require(xmpObj.GetInternalRef());
-  s.editor.reset();
-  s.whole.reset();
-  s.expected.reset();
-  s.fragments.clear();
-
   // What to write: the changes since the packet was handed out, or, for a
   // packet from elsewhere, its properties over the stored ones.
-  std::vector<Key> changed;
-  std::set<std::pair<std::string, std::string>> removed;
+  std::vector<detail::Key> changed;
   if (packet.Tracked()) {
-    if (packet.Baseline()) {
-      const XMPMeta before = OwnPacket(detail::DeepCopy(packet.Baseline()));
-      changed = Differences(before, xmpObj);
-    }
+    if (packet.Baseline()) changed = detail::Differences(detail::OwnPacket(detail::DeepCopy(packet.Baseline())), xmpObj);
   } else {
-    changed = Properties(xmpObj);
+    changed = detail::Properties(xmpObj);
   }
-  if (changed.empty()) return;
-
-  XMPMeta expected;
-  if (s.stored) {
-    try {
-      expected.ParseFromBuffer(*s.stored);
-    } catch (const XMP_Error& e) {
-      throw XMP_Error(kXMPErr_BadXMP, std::string("its XMP packet cannot be read, so it is left as it is (") +
-                                        e.GetErrMsg() + ")");
-    }
-  }
-  for (const Key& key : changed) {
-    detail::Node node;
-    if (detail::ReadNode(xmpObj, key.ns, key.name, &node)) {
-      detail::WriteNode(expected, key.ns, key.name, node);
-    } else {
-      expected.DeleteProperty(key.ns, key.name);
-    }
-  }
-  if (s.stored) {
-    auto editor = std::make_unique<detail::PacketEditor>();
-    std::string problem;
-    if (editor->Load(*s.stored, &problem) && editor->Editable()) {
-      for (const Key& key : changed) {
-        if (xmpObj.DoesPropertyExist(key.ns, key.name)) {
-          s.fragments.emplace_back(key, FragmentOf(xmpObj, key));
-          editor->Put(key.ns, LocalName(key.name), s.fragments.back().second);
-        } else {
-          editor->Remove(key.ns, LocalName(key.name));
-        }
-      }
-      s.editor = std::move(editor);
-    }
-  }
-  if (!s.editor) {
-    // No stored packet, or one written in a form edits cannot follow: the
-    // packet is written whole.
-    std::string text;
-    expected.SerializeToBuffer(&text, 0, 0);
-    s.whole = std::move(text);
-  }
-  s.expected = std::move(expected);
-  s.changed = std::move(changed);
-}
-
-// The properties the written packet would not read back as intended. A
-// packet written whole must read back as expected. An edited one is
-// checked in parts, since the toolkit's reader normalises some packets as a
-// whole (an rdf:about "uuid:..." also reads as xmpMM:InstanceID): every
-// property left alone reads back as it read before, and every fragment put
-// in reads, on its own, as the property it stands for.
-std::vector<std::string> XMPFiles::State::Misread(const std::string& text) const {
-  XMPMeta check;
-  check.ParseFromBuffer(text);
-  std::vector<std::string> wrong;
-  if (!editor) {
-    for (const Key& key : Differences(check, *expected)) wrong.push_back(key.name);
-    return wrong;
-  }
-  const auto isChanged = [&](const Key& key) {
-    return std::any_of(changed.begin(), changed.end(), [&](const Key& k) { return k.ns == key.ns && k.name == key.name; });
-  };
-  XMPMeta before;
-  before.ParseFromBuffer(*stored);
-  for (const Key& key : Differences(before, check)) {
-    if (!isChanged(key)) wrong.push_back(key.name);
-  }
-  for (const Key& key : changed) {
-    if (check.DoesPropertyExist(key.ns, key.name) != expected->DoesPropertyExist(key.ns, key.name))
-      wrong.push_back(key.name);
-  }
-  for (const auto& [key, fragment] : fragments) {
-    std::string alone = "<x:xmpmeta xmlns:x=\"adobe:ns:meta/\"><rdf:RDF xmlns:rdf=\"" + std::string(kXMP_NS_RDF) +
-                        "\"><rdf:Description rdf:about=\"\"";
-    for (const auto& ns : fragment.namespaces) {
-      if (ns.first != "rdf") alone += " xmlns:" + ns.first + "=\"" + ns.second + "\"";
-    }
-    alone += ">" + fragment.text + "</rdf:Description></rdf:RDF></x:xmpmeta>";
-    XMPMeta single;
-    single.ParseFromBuffer(alone);
-    if (CanonicalOf(single, key) != CanonicalOf(*expected, key)) wrong.push_back(key.name);
-  }
-  return wrong;
+  s.pending = !changed.empty();
+  if (s.pending) s.stored->Apply(xmpObj, changed, s.sidecar ? std::nullopt : s.container->PacketLimit());
 }
 
 void XMPFiles::State::Write() {
-  std::vector<std::string> candidates;  // the packet at its old length first
-  if (editor) {
-    if (stored && !sidecar) {
-      if (auto same = editor->Render(stored->size())) candidates.push_back(std::move(*same));
-    }
-    if (auto grown = editor->Render(std::nullopt)) candidates.push_back(std::move(*grown));
-    if (candidates.empty()) throw XMP_Error(kXMPErr_InternalFailure, "the XMP packet could not be edited");
-  } else {
-    if (stored && !sidecar) {
-      std::string same;
-      try {
-        expected->SerializeToBuffer(&same, kXMP_ExactPacketLength, static_cast<std::uint32_t>(stored->size()));
-        candidates.push_back(std::move(same));
-      } catch (const XMP_Error&) {
-        // Too long for the old place: the grown packet below.
-      }
-    }
-    candidates.push_back(*whole);
-  }
-  // What is written must read back as the stored packet with the changes.
-  const std::vector<std::string> wrong = Misread(candidates.back());
-  if (!wrong.empty()) {
-    std::string names;
-    for (const std::string& name : wrong) names += (names.empty() ? "" : ", ") + name;
-    throw XMP_Error(kXMPErr_InternalFailure, "the edited XMP did not read back as written (" + names +
-                                               "), so the file is left as it is");
-  }
-
+  const std::vector<std::string> candidates = stored->Candidates();
   detail::WritePlan plan;
   std::string problem = "the packet cannot be written";
   bool planned = false;
@@ -443,6 +251,7 @@ void XMPFiles::State::Write() {
     plan.Insert(candidates.back());
     planned = true;
   } else {
+    container->SetExtension(stored->NewExtension());
     for (const std::string& text : candidates) {
       detail::WritePlan attempt;
       if (container->PlanWrite(*reader, text, &attempt, &problem)) {
@@ -462,12 +271,12 @@ void XMPFiles::CloseFile(XMP_OptionBits) {
   State& s = *mState;
   if (!s.open) return;
   s.open = false;
-  const bool write = s.ForUpdate() && s.expected.has_value();
+  const bool write = s.ForUpdate() && s.pending;
+  s.pending = false;
   if (write) s.Write();
   s.replacement.reset();
   s.reader.reset();
-  s.editor.reset();
-  s.expected.reset();
+  s.stored.reset();
 }
 
 std::string XMPFiles::GetVersionInfo() {

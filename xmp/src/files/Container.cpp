@@ -7,7 +7,10 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
+
+#include <boost/uuid/detail/md5.hpp>
 
 #include <ovracore/SafeWrite.h>
 
@@ -66,6 +69,16 @@ std::string PutBE32(std::uint32_t v) {
 }
 std::string PutLE32(std::uint32_t v) {
   return {char(v & 0xFF), char((v >> 8) & 0xFF), char((v >> 16) & 0xFF), char(v >> 24)};
+}
+
+std::string ExtensionDigest(const std::string& extension) {
+  boost::uuids::detail::md5 hash;
+  hash.process_bytes(extension.data(), extension.size());
+  boost::uuids::detail::md5::digest_type digest;
+  hash.get_digest(digest);
+  char hex[33];
+  for (int i = 0; i < 4; ++i) std::snprintf(hex + 8 * i, 9, "%08X", static_cast<unsigned>(digest[i]));
+  return std::string(hex, 32);
 }
 
 // ---------------------------------------------------------------- WritePlan

@@ -85,6 +85,10 @@ class WritePlan {
 void CopyWithPatches(WritePlan* plan, std::uint64_t size,
                      std::vector<std::pair<std::uint64_t, std::string>> patches);
 
+// How a packet names its extension: the MD5 digest of the extension's text
+// as 32 upper-case hexadecimal digits.
+std::string ExtensionDigest(const std::string& extension);
+
 struct Extent {
   std::uint64_t offset = 0;
   std::uint64_t length = 0;
@@ -104,6 +108,14 @@ class Container {
   const std::optional<Extent>& Packet() const { return mPacket; }
   // The text of the stored packet. Throws IOError when a read fails.
   virtual std::string PacketText(const FileReader& file) const;
+  // Where the format continues a packet too large for one place (JPEG's
+  // Extended XMP): the continuation's text, none when the file has none;
+  // and the largest packet one place holds.
+  virtual std::optional<std::string> ExtensionText(const FileReader&) const { return std::nullopt; }
+  virtual std::optional<std::size_t> PacketLimit() const { return std::nullopt; }
+  // The continuation the next PlanWrite writes: none leaves the file's as
+  // it is, an empty one removes it.
+  void SetExtension(std::optional<std::string> text) { mNewExtension = std::move(text); }
   // Whether the file holds metadata of its own (EXIF, IPTC, movie headers,
   // RIFF INFO, ID3) that the toolkit's handler shows beside the packet.
   bool HasNativeMetadata() const { return mNative; }
@@ -124,6 +136,7 @@ class Container {
 
   std::optional<Extent> mPacket;
   bool mNative = false;
+  std::optional<std::string> mNewExtension;
 };
 
 // The container the file's first bytes announce; for anything else one that

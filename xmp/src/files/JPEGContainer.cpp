@@ -23,16 +23,7 @@ class JPEGContainer : public Container {
   const char* Name() const override { return "JPEG"; }
 
   bool Walk(const FileReader& file, std::string* problem) override {
-    struct Chunk {
-      std::uint32_t offset;
-      std::uint32_t length;
-      std::uint64_t fileOffset;
-    };
-    struct Group {
-      std::uint32_t fullLength = 0;
-      std::vector<Chunk> chunks;
-    };
-    std::map<std::string, Group> extended;
+    std::map<std::string, Group>& extended = mGroups;
     std::uint64_t pos = 2;
     std::uint64_t segments = 0;
     bool leading = true;  // still in the APP0/APP1 run after the start marker
@@ -110,32 +101,95 @@ class JPEGContainer : public Container {
       std::string why;
       if (!ScanPacket(whole, &why)) return Refuse(problem, "Extended XMP: " + why);
     }
-    // The toolkit's handler joins Extended XMP to the packet for reading.
-    if (!mExtended.empty()) mNative = true;
     return true;
+  }
+
+  std::optional<std::size_t> PacketLimit() const override { return kMaxStandardPacket; }
+
+  // The Extended XMP the packet names by its digest (xmpNote:HasExtendedXMP).
+  std::optional<std::string> ExtensionText(const FileReader& file) const override {
+    if (!mPacket || mGroups.empty()) return std::nullopt;
+    const std::string packet = PacketText(file);
+    const std::size_t note = packet.find("HasExtendedXMP");
+    if (note == std::string::npos) return std::nullopt;
+    for (const auto& [guid, group] : mGroups) {
+      if (packet.find(guid, note) == std::string::npos) continue;
+      std::string whole;
+      for (const Chunk& chunk : group.chunks) whole += file.ReadText(chunk.fileOffset, chunk.length);
+      return whole;
+    }
+    return std::nullopt;
   }
 
   bool PlanWrite(const FileReader& file, const std::string& packet, WritePlan* plan,
                  std::string* problem) const override {
-    if (!mExtended.empty()) return Refuse(problem, "files with Extended XMP are not written");
-    if (SameLengthInPlace(file, packet, plan)) return true;
+    if (!mNewExtension && SameLengthInPlace(file, packet, plan)) return true;
     if (packet.size() > kMaxStandardPacket)
       return Refuse(problem, "the XMP packet would be larger than one JPEG segment holds");
+    std::string segments = Segment(std::string(kXMPSignature, sizeof kXMPSignature) + packet);
+    // Segments that go: the old packet's, and the old extension's when a new
+    // one (or none) takes its place.
+    std::vector<Extent> gone;
+    if (mPacket) gone.push_back(mSegment);
+    if (mNewExtension) {
+      gone.insert(gone.end(), mExtended.begin(), mExtended.end());
+      segments += ExtensionSegments(*mNewExtension);
+    }
+    std::sort(gone.begin(), gone.end(), [](const Extent& a, const Extent& b) { return a.offset < b.offset; });
     const std::uint64_t at = mPacket ? mSegment.offset : mInsertAt;
-    const std::uint64_t resume = mPacket ? mSegment.End() : mInsertAt;
-    std::string segment = "\xFF\xE1";
-    const std::size_t length = 2 + sizeof kXMPSignature + packet.size();
-    segment += static_cast<char>(length >> 8);
-    segment += static_cast<char>(length & 0xFF);
-    segment.append(kXMPSignature, sizeof kXMPSignature);
-    segment += packet;
-    plan->Copy(0, at);
-    plan->Insert(std::move(segment));
-    plan->Copy(resume, file.Size());
+    std::uint64_t from = 0;
+    bool placed = false;
+    for (const Extent& segment : gone) {
+      if (!placed && at <= segment.offset) {
+        plan->Copy(from, at);
+        plan->Insert(segments);
+        from = at;
+        placed = true;
+      }
+      plan->Copy(from, segment.offset);
+      from = segment.End();
+    }
+    if (!placed) {
+      plan->Copy(from, at);
+      plan->Insert(std::move(segments));
+      from = at;
+    }
+    plan->Copy(from, file.Size());
     return true;
   }
 
  private:
+  struct Chunk {
+    std::uint32_t offset;
+    std::uint32_t length;
+    std::uint64_t fileOffset;
+  };
+  struct Group {
+    std::uint32_t fullLength = 0;
+    std::vector<Chunk> chunks;
+  };
+
+  static std::string Segment(const std::string& content) {
+    const std::size_t length = 2 + content.size();
+    return std::string("\xFF\xE1", 2) + static_cast<char>(length >> 8) + static_cast<char>(length & 0xFF) + content;
+  }
+
+  // Extended XMP in segments: signature, the digest as 32 hexadecimal
+  // digits, the full length and the offset of each piece.
+  static std::string ExtensionSegments(const std::string& extension) {
+    if (extension.empty()) return std::string();
+    std::string segments;
+    const std::string digest = ExtensionDigest(extension);
+    constexpr std::size_t kPiece = 65400;
+    for (std::size_t offset = 0; offset < extension.size(); offset += kPiece) {
+      segments += Segment(std::string(kExtendedSignature, sizeof kExtendedSignature) + digest +
+                          PutBE32(static_cast<std::uint32_t>(extension.size())) +
+                          PutBE32(static_cast<std::uint32_t>(offset)) + extension.substr(offset, kPiece));
+    }
+    return segments;
+  }
+
+  std::map<std::string, Group> mGroups;  // Extended XMP by digest
   Extent mSegment;             // the whole APP1 segment of the packet
   std::uint64_t mInsertAt = 2;  // where a new XMP segment goes
   std::vector<Extent> mExtended;  // the segments of Extended XMP

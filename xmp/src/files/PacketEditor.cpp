@@ -7,8 +7,6 @@ namespace ovraxmp {
 namespace detail {
 namespace {
 
-constexpr std::size_t kGrowthPadding = 2048;
-
 std::string EscapeAttribute(const std::string& text) {
   std::string out;
   for (char c : text) {
@@ -69,10 +67,15 @@ bool PacketEditor::Has(const std::string& ns, const std::string& name) const {
 }
 
 void PacketEditor::Put(const std::string& ns, const std::string& name, Fragment fragment) {
-  mEdits.push_back({ns, name, std::move(fragment)});
+  Remove(ns, name);
+  mEdits.back().fragment = std::move(fragment);
 }
 
 void PacketEditor::Remove(const std::string& ns, const std::string& name) {
+  // The last edit of a property is the one that counts.
+  mEdits.erase(std::remove_if(mEdits.begin(), mEdits.end(),
+                              [&](const Edit& e) { return e.ns == ns && e.name == name; }),
+               mEdits.end());
   mEdits.push_back({ns, name, std::nullopt});
 }
 
@@ -83,7 +86,15 @@ std::string PacketEditor::Indentation(std::size_t at) const {
   return mText.substr(start, at - start);
 }
 
-std::optional<std::string> PacketEditor::Render(std::optional<std::size_t> length) const {
+std::vector<std::tuple<std::string, std::string, std::size_t>> PacketEditor::PropertySizes() const {
+  std::vector<std::tuple<std::string, std::string, std::size_t>> sizes;
+  for (const auto& p : mLayout.properties) sizes.emplace_back(p.ns, p.name, p.end - p.begin);
+  std::stable_sort(sizes.begin(), sizes.end(),
+                   [](const auto& a, const auto& b) { return std::get<2>(a) > std::get<2>(b); });
+  return sizes;
+}
+
+std::optional<std::string> PacketEditor::Render(std::optional<std::size_t> length, std::size_t growthPadding) const {
   const std::size_t descriptions = mLayout.descriptions.size();
   std::vector<std::map<std::string, std::string>> scopes;
   for (const auto& description : mLayout.descriptions) scopes.push_back(description.scope);
@@ -215,7 +226,7 @@ std::optional<std::string> PacketEditor::Render(std::optional<std::size_t> lengt
     if (body.size() + trailer.size() > *length) return std::nullopt;
     return body + Padding(*length - body.size() - trailer.size()) + trailer;
   }
-  return body + (marker != std::string::npos ? Padding(kGrowthPadding) : oldPadding) + trailer;
+  return body + (marker != std::string::npos ? Padding(growthPadding) : oldPadding) + trailer;
 }
 
 }  // namespace detail

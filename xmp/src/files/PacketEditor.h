@@ -6,6 +6,7 @@
 #pragma once
 
 #include <optional>
+#include <tuple>
 #include <string>
 #include <utility>
 #include <vector>
@@ -31,15 +32,19 @@ class PacketEditor {
   bool Editable() const { return mLayout.editable; }
   bool Has(const std::string& ns, const std::string& name) const;
 
-  // Replaces the property (every occurrence) with fragment, or adds it.
+  // Replaces the property (every occurrence) with fragment, or adds it;
+  // a later Put or Remove of the same property takes the earlier one back.
   void Put(const std::string& ns, const std::string& name, Fragment fragment);
   void Remove(const std::string& ns, const std::string& name);
 
   // The edited packet. With length, exactly that many bytes (the padding
   // before the packet's end marker absorbs the difference), or nothing when
-  // the edits do not fit; without, the padding grows to 2 KB when the
-  // packet has a wrapper.
-  std::optional<std::string> Render(std::optional<std::size_t> length) const;
+  // the edits do not fit; without, the padding becomes growthPadding bytes
+  // when the packet has a wrapper.
+  std::optional<std::string> Render(std::optional<std::size_t> length, std::size_t growthPadding = 2048) const;
+  // The bytes each stored top-level property takes (namespace URI, local
+  // name, size), largest first.
+  std::vector<std::tuple<std::string, std::string, std::size_t>> PropertySizes() const;
 
  private:
   struct Edit {
