@@ -43,21 +43,6 @@ TEST(XMPIterator, WholePacketNamespaceAndSubtree) {
   EXPECT_EQ(Walk(withQualifiers), (std::vector<std::string>{"xmpDM:shotName", "xmpDM:shotName/?xmpDM:good"}));
 }
 
-TEST(XMPIterator, SkipSubtreeAndSiblings) {
-  const XMPMeta meta = xmptest::Parse(xmptest::RealWorldPacket());
-  XMPIterator it(meta, kXMP_NS_DC);
-  std::vector<std::string> seen;
-  std::string path;
-  while (it.Next(nullptr, &path)) {
-    seen.push_back(path);
-    if (path == "dc:title") it.Skip(kXMP_IterSkipSubtree);
-    if (path == "dc:creator[1]") it.Skip(kXMP_IterSkipSiblings);
-  }
-  EXPECT_EQ(seen, (std::vector<std::string>{"", "dc:title", "dc:creator", "dc:creator[1]", "dc:subject",
-                                            "dc:subject[1]", "dc:subject[2]", "dc:subject[3]"}));
-  EXPECT_THROW(it.Skip(0x8), XMP_Error);
-}
-
 TEST(XMPIterator, UnknownNamespaceOrMissingPropertyIsEmpty) {
   const XMPMeta meta = xmptest::Parse(xmptest::RealWorldPacket());
   XMPIterator unknown(meta, "http://ovra.test/unregistered/");

@@ -28,7 +28,7 @@ class XMPMultiFile : public ::testing::Test {
       m.AppendArrayItem(kTestNS, "Bag", kXMP_PropValueIsArray, i == 2 ? "y" : "x");
       m.AppendArrayItem(kTestNS, "Bag", 0, i == 2 ? "x" : "y");
       m.SetProperty(kTestNS, "Qualified", "q");
-      m.SetQualifier(kTestNS, "Qualified", kTestNS, "Unit", i == 0 ? "mm" : "cm");
+      m.SetProperty(kTestNS, "Qualified/?ovt:Unit", i == 0 ? "mm" : "cm");
     }
   }
 

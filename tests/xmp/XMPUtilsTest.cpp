@@ -188,8 +188,7 @@ TEST_F(XMPUtilsTest, AppendPropertiesMergesReplacesAndDeletesEmpty) {
             (std::vector<std::string>{"lake", "own", "dusk; blue hour", "\"quoted\""}));
   EXPECT_EQ(Get(dest, kXMP_NS_DC, "creator[2]"), "Bo Chen");
   EXPECT_EQ(Get(dest, kXMP_NS_DM, "shotName"), "Take 7");
-  std::string qual;
-  EXPECT_TRUE(dest.GetQualifier(kXMP_NS_DM, "shotName", kXMP_NS_DM, "good", &qual));
+  EXPECT_TRUE(dest.DoesPropertyExist(kXMP_NS_DM, "shotName/?xmpDM:good"));
   EXPECT_FALSE(dest.DoesPropertyExist(kXMP_NS_XMP_MM, "History"));  // internal without DoAll
   EXPECT_EQ(Get(dest, kTestNS, "Empty"), "present");
 
@@ -209,7 +208,7 @@ TEST_F(XMPUtilsTest, DuplicateSubtreeCopiesAndRemovePropertiesRemoves) {
   XMPMeta dest;
   dest.SetStructField(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "filePath", "old");
   XMPUtils::DuplicateSubtree(source, &dest, kXMP_NS_XMP_MM, "DerivedFrom");
-  EXPECT_FALSE(dest.DoesStructFieldExist(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "filePath"));
+  EXPECT_FALSE(dest.DoesPropertyExist(kXMP_NS_XMP_MM, "DerivedFrom/stRef:filePath"));
   EXPECT_EQ(Get(dest, kXMP_NS_XMP_MM, "DerivedFrom/stRef:documentID"), "xmp.did:66666666-7777-8888-9999-000000000000");
   XMPUtils::DuplicateSubtree(source, &dest, kXMP_NS_DC, "dc:creator", kTestNS, "Authors");
   EXPECT_EQ(Items(dest, kTestNS, "Authors"), (std::vector<std::string>{"Ana Müller", "Bo Chen"}));

@@ -313,16 +313,4 @@ void XMPUtils::CurrentDateTime(XMP_DateTime* time) {
   *time = t;
 }
 
-int XMPUtils::CompareDateTime(const XMP_DateTime& left, const XMP_DateTime& right) {
-  XMP_DateTime a = left, b = right;
-  ConvertToUTCTime(&a);
-  ConvertToUTCTime(&b);
-  const auto key = [](const XMP_DateTime& t) {
-    return std::make_tuple(t.hasDate ? t.year : 0, t.month, t.day, t.hour, t.minute, t.second, t.nanoSecond);
-  };
-  if (key(a) < key(b)) return -1;
-  if (key(b) < key(a)) return 1;
-  return 0;
-}
-
 }  // namespace ovraxmp

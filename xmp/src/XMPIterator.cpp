@@ -57,12 +57,4 @@ bool XMPIterator::Next(std::string* schemaNS, std::string* propPath, std::string
   return true;
 }
 
-void XMPIterator::Skip(XMP_OptionBits options) {
-  if (!mIter) return;
-  if (options != kXMP_IterSkipSubtree && options != kXMP_IterSkipSiblings)
-    detail::Throw(kXMPErr_BadOptions, "skip options");
-  if (!xmp_iterator_skip(static_cast<XmpIteratorPtr>(mIter), static_cast<XmpIterSkipOptions>(options)))
-    detail::ThrowLastError(kXMPErr_BadIterPosition, "skipping");
-}
-
 }  // namespace ovraxmp

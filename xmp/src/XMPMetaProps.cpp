@@ -396,15 +396,6 @@ bool XMPMeta::GetProperty_Float(const std::string& ns, const std::string& name, 
                       [](const std::string& text) { return XMPUtils::ConvertToFloat(text); });
 }
 
-bool XMPMeta::GetProperty_Date(const std::string& ns, const std::string& name, XMP_DateTime* value,
-                               XMP_OptionBits* options) const {
-  return GetConverted(*this, ns, name, value, options, [](const std::string& text) {
-    XMP_DateTime converted;
-    XMPUtils::ConvertToDate(text, &converted);
-    return converted;
-  });
-}
-
 void XMPMeta::SetProperty_Bool(const std::string& ns, const std::string& name, bool value,
                                XMP_OptionBits options) {
   std::string text;
@@ -537,18 +528,6 @@ void XMPMeta::DeleteArrayItem(const std::string& nsIn, const std::string& arrayN
   if (exists) DeleteProperty(ns, path);
 }
 
-bool XMPMeta::DoesArrayItemExist(const std::string& nsIn, const std::string& arrayNameIn, XMP_Index index) const {
-  std::string aliasNS, aliasPath;
-  const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
-  const std::string& ns = aliased ? aliasNS : nsIn;
-  const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
-  std::string path;
-  XMPUtils::ComposeArrayItemPath(ns, arrayName, index, &path);
-  bool exists = false;
-  RequireArray(X(mRef), ns, arrayName, &exists);
-  return exists && DoesPropertyExist(ns, path);
-}
-
 XMP_Index XMPMeta::CountArrayItems(const std::string& nsIn, const std::string& arrayNameIn) const {
   std::string aliasNS, aliasPath;
   const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
@@ -597,53 +576,6 @@ void XMPMeta::SetStructField(const std::string& ns, const std::string& structNam
   if (NodeOptions(X(mRef), ns, structName, &parent) && !(parent & kXMP_PropValueIsStruct))
     detail::Throw(kXMPErr_BadXPath, "\"" + structName + "\" is not a structure");
   SetProperty(ns, path, value, options);
-}
-
-void XMPMeta::DeleteStructField(const std::string& ns, const std::string& structName, const std::string& fieldNS,
-                                const std::string& fieldName) {
-  std::string path;
-  XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName, &path);
-  XMP_OptionBits parent = 0;
-  if (NodeOptions(X(mRef), ns, structName, &parent) && (parent & kXMP_PropValueIsStruct)) DeleteProperty(ns, path);
-}
-
-bool XMPMeta::DoesStructFieldExist(const std::string& ns, const std::string& structName,
-                                   const std::string& fieldNS, const std::string& fieldName) const {
-  std::string path;
-  XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName, &path);
-  XMP_OptionBits parent = 0;
-  return NodeOptions(X(mRef), ns, structName, &parent) && (parent & kXMP_PropValueIsStruct) &&
-         DoesPropertyExist(ns, path);
-}
-
-bool XMPMeta::GetQualifier(const std::string& ns, const std::string& propName, const std::string& qualNS,
-                           const std::string& qualName, std::string* value, XMP_OptionBits* options) const {
-  std::string path;
-  XMPUtils::ComposeQualifierPath(ns, propName, qualNS, qualName, &path);
-  return GetProperty(ns, path, value, options);
-}
-
-void XMPMeta::SetQualifier(const std::string& ns, const std::string& propName, const std::string& qualNS,
-                           const std::string& qualName, const std::string& value, XMP_OptionBits options) {
-  std::string path;
-  XMPUtils::ComposeQualifierPath(ns, propName, qualNS, qualName, &path);
-  if (!DoesPropertyExist(ns, propName))
-    detail::Throw(kXMPErr_BadXPath, "qualified property \"" + propName + "\" does not exist");
-  SetProperty(ns, path, value, options);
-}
-
-void XMPMeta::DeleteQualifier(const std::string& ns, const std::string& propName, const std::string& qualNS,
-                              const std::string& qualName) {
-  std::string path;
-  XMPUtils::ComposeQualifierPath(ns, propName, qualNS, qualName, &path);
-  DeleteProperty(ns, path);
-}
-
-bool XMPMeta::DoesQualifierExist(const std::string& ns, const std::string& propName, const std::string& qualNS,
-                                 const std::string& qualName) const {
-  std::string path;
-  XMPUtils::ComposeQualifierPath(ns, propName, qualNS, qualName, &path);
-  return DoesPropertyExist(ns, path);
 }
 
 // ---- localised text ----

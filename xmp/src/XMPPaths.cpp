@@ -46,17 +46,6 @@ void XMPUtils::ComposeQualifierPath(const std::string& schemaNS, const std::stri
   *fullPath = propName + "/?" + prefix + qualName;
 }
 
-void XMPUtils::ComposeLangSelector(const std::string& schemaNS, const std::string& arrayName,
-                                   const std::string& langName, std::string* fullPath) {
-  detail::RequirePrefix(schemaNS);
-  RequireName(arrayName, "array name");
-  RequireName(langName, "language");
-  std::string lang = langName;
-  for (char& c : lang)
-    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
-  *fullPath = arrayName + "[?xml:lang=\"" + lang + "\"]";
-}
-
 bool XMPMeta::IsMultiValued(const std::string& ns, const std::string& path) const {
   XMPPacket& packet = detail::Require(mRef);
   if (packet.Marks().empty()) return false;

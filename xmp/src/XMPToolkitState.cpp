@@ -119,16 +119,6 @@ bool XMPMeta::GetNamespacePrefix(const std::string& namespaceURI, std::string* p
   return detail::LookupPrefix(namespaceURI, prefix);
 }
 
-bool XMPMeta::GetNamespaceURI(const std::string& prefix, std::string* namespaceURI) {
-  detail::EnsureStarted();
-  const std::string bare = WithoutColon(prefix);
-  if (bare.empty()) return false;
-  detail::XmpString found;
-  if (!xmp_prefix_namespace_uri(bare.c_str(), found)) return false;
-  if (namespaceURI) *namespaceURI = found.str();
-  return true;
-}
-
 std::string XMPMeta::GetVersionInfo() {
   detail::EnsureStarted();
   // The core names itself in the x:xmptk attribute of every packet it writes.

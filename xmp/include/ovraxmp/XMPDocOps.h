@@ -21,7 +21,6 @@ class XMPDocOps {
   // Parts such as "/metadata" or "/metadata/dc/title"; duplicates count once.
   void NoteChange(const std::string& part);
   void NoteChange(const std::vector<std::string>& parts);
-  bool IsDirty() const { return !mParts.empty(); }
   // With changes noted: appends to xmpMM:History a "saved" event (new
   // instance id "xmp.iid:<uuid>", when = now with local offset,
   // softwareAgent = the client name, changed = the parts joined by ";"),
@@ -31,8 +30,6 @@ class XMPDocOps {
   // Answers false (and changes nothing) when nothing was noted; throws
   // kXMPErr_BadObject when no packet is attached.
   bool PrepareForSave(const std::string& mimeType);
-  // The packet attached, null when none.
-  XMPMetaRef GetMetaRef() const { return mMeta.GetInternalRef(); }
 
   // A fresh "xmp.iid:" / "xmp.did:" identifier.
   static std::string NewInstanceID();

@@ -28,9 +28,6 @@ class XMPIterator {
   // False when the iteration is over; the out values may be null.
   bool Next(std::string* schemaNS = nullptr, std::string* propPath = nullptr, std::string* propValue = nullptr,
             XMP_OptionBits* options = nullptr);
-  // kXMP_IterSkipSubtree: do not descend below the node last returned;
-  // kXMP_IterSkipSiblings: also skip its remaining siblings.
-  void Skip(XMP_OptionBits options);
 
  private:
   void Open(const std::string& schemaNS, const std::string& propName, XMP_OptionBits options);

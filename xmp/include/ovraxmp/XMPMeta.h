@@ -79,8 +79,6 @@ class XMPMeta {
                          std::int64_t* propValue, XMP_OptionBits* options = nullptr) const;
   bool GetProperty_Float(const std::string& schemaNS, const std::string& propName,
                          double* propValue, XMP_OptionBits* options = nullptr) const;
-  bool GetProperty_Date(const std::string& schemaNS, const std::string& propName,
-                        XMP_DateTime* propValue, XMP_OptionBits* options = nullptr) const;
   void SetProperty_Bool(const std::string& schemaNS, const std::string& propName, bool propValue,
                         XMP_OptionBits options = 0);
   void SetProperty_Int(const std::string& schemaNS, const std::string& propName,
@@ -106,8 +104,6 @@ class XMPMeta {
                        XMP_OptionBits arrayOptions, const std::string& itemValue,
                        XMP_OptionBits options = 0);
   void DeleteArrayItem(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex);
-  bool DoesArrayItemExist(const std::string& schemaNS, const std::string& arrayName,
-                          XMP_Index itemIndex) const;
   // 0 for an absent array; kXMPErr_BadXPath when the property is not one.
   XMP_Index CountArrayItems(const std::string& schemaNS, const std::string& arrayName) const;
 
@@ -119,21 +115,6 @@ class XMPMeta {
   void SetStructField(const std::string& schemaNS, const std::string& structName,
                       const std::string& fieldNS, const std::string& fieldName,
                       const std::string& fieldValue, XMP_OptionBits options = 0);
-  void DeleteStructField(const std::string& schemaNS, const std::string& structName,
-                         const std::string& fieldNS, const std::string& fieldName);
-  bool DoesStructFieldExist(const std::string& schemaNS, const std::string& structName,
-                            const std::string& fieldNS, const std::string& fieldName) const;
-  bool GetQualifier(const std::string& schemaNS, const std::string& propName,
-                    const std::string& qualNS, const std::string& qualName,
-                    std::string* qualValue, XMP_OptionBits* options = nullptr) const;
-  // The property must exist (kXMPErr_BadXPath otherwise).
-  void SetQualifier(const std::string& schemaNS, const std::string& propName,
-                    const std::string& qualNS, const std::string& qualName,
-                    const std::string& qualValue, XMP_OptionBits options = 0);
-  void DeleteQualifier(const std::string& schemaNS, const std::string& propName,
-                       const std::string& qualNS, const std::string& qualName);
-  bool DoesQualifierExist(const std::string& schemaNS, const std::string& propName,
-                          const std::string& qualNS, const std::string& qualName) const;
 
   // ---- Localised text (language alternatives) ----
   // Chooses by the XMP rules: the specific language, else the first item of
@@ -185,8 +166,6 @@ class XMPMeta {
   // The prefix with trailing colon ("dc:"); false (prefix untouched) when
   // the namespace is not registered.
   static bool GetNamespacePrefix(const std::string& namespaceURI, std::string* prefix);
-  // Accepts the prefix with or without colon; false when it is not registered.
-  static bool GetNamespaceURI(const std::string& prefix, std::string* namespaceURI);
 
  private:
   XMPMetaRef mRef = nullptr;

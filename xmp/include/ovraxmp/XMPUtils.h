@@ -26,9 +26,6 @@ class XMPUtils {
   static void ComposeQualifierPath(const std::string& schemaNS, const std::string& propName,
                                    const std::string& qualNS, const std::string& qualName,
                                    std::string* fullPath);
-  // arrayName[?xml:lang="lang"] with the language in lower case.
-  static void ComposeLangSelector(const std::string& schemaNS, const std::string& arrayName,
-                                  const std::string& langName, std::string* fullPath);
 
   // ---- Conversions; text that does not convert raises kXMPErr_BadValue ----
   static void ConvertFromBool(bool binValue, std::string* strValue);        // "True"/"False"
@@ -55,8 +52,6 @@ class XMPUtils {
   static void ConvertToLocalTime(XMP_DateTime* time);
   // Now, in the local zone, with the zone offset.
   static void CurrentDateTime(XMP_DateTime* time);
-  // <0, 0, >0 comparing the instants (both moved to UTC first).
-  static int CompareDateTime(const XMP_DateTime& left, const XMP_DateTime& right);
 
   // ---- Array text ----
   // Joins the items of a simple-item, non-alternate array with separator;
