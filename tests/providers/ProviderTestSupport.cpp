@@ -1,15 +1,11 @@
 #include "ProviderTestSupport.h"
 
-#include <linux/capability.h>
-#include <sys/syscall.h>
-
 #include <stdexcept>
 
 #include <gtest/gtest.h>
 
 #include <ovrametadata/Definitions.h>
 
-#include "../xmp/HostileInputs.h"
 #include "MediaFiles.h"
 
 namespace ovratest {
@@ -202,21 +198,6 @@ std::u16string U16Path(const fs::path& path) { return ovracore::ToUTF16(path.str
 
 boost::shared_ptr<FileProvider> OpenFile(const fs::path& path) {
   return boost::make_shared<FileProvider>(U16Path(path));
-}
-
-int RunWithoutPermissionOverride(const std::function<int()>& fn) {
-  const hostile::ChildResult run = hostile::RunIsolated([&] {
-    __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
-    __user_cap_data_struct data[2] = {};
-    if (::syscall(SYS_capget, &header, data) != 0) return 77;
-    for (int cap : {CAP_DAC_OVERRIDE, CAP_DAC_READ_SEARCH, CAP_FOWNER}) {
-      data[cap / 32].effective &= ~(1u << (cap % 32));
-      data[cap / 32].permitted &= ~(1u << (cap % 32));
-    }
-    if (::syscall(SYS_capset, &header, data) != 0) return 77;
-    return fn();
-  });
-  return run.exited ? run.code : 78;
 }
 
 }  // namespace ovratest

@@ -115,9 +115,5 @@ void PutXMPIntoFile(const std::filesystem::path& file, const ovraxmp::XMPMeta& p
 std::u16string U16Path(const std::filesystem::path& path);
 boost::shared_ptr<ovrametadata::FileProvider> OpenFile(const std::filesystem::path& path);
 
-// Runs fn in a child process that has lost the power to override file
-// permissions (running as root otherwise ignores them) and returns its exit
-// code; 77 means the child could not give up that power.
-int RunWithoutPermissionOverride(const std::function<int()>& fn);
 
 }  // namespace ovratest

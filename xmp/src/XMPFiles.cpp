@@ -154,6 +154,12 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
     std::string problem;
     if (!s.replacement->Open(s.target, false, &problem)) return s.Refuse(problem);
     if (!s.Examine(s.replacement->ReadFD(), s.replacement->OriginalSize())) return false;
+    try {
+      s.stored->Parsed();
+    } catch (const XMP_Error&) {
+      // XMP nobody can read is never replaced.
+      return s.Refuse("its XMP packet cannot be read, so it is left as it is");
+    }
   }
   s.open = true;
   return true;

@@ -154,7 +154,7 @@ bool Container::PlanWrite(const FileReader& file, const std::string& packet, Wri
                           std::string* problem) const {
   if (SameLengthInPlace(file, packet, plan)) return true;
   return Refuse(problem, mPacket ? "the XMP packet has no room for the new metadata"
-                                 : "no XMP packet to write into");
+                                 : "files of this kind are written only where they already hold an XMP packet");
 }
 
 std::unique_ptr<Container> ContainerFor(const FileReader& file) {

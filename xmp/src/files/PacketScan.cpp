@@ -174,8 +174,11 @@ bool LooksUTF8(std::string_view text) {
 }  // namespace
 
 bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layout) {
-  // Trailing NULs are padding some writers leave; the toolkit ignores them.
-  while (!text.empty() && text.back() == '\0') text.remove_suffix(1);
+  // Trailing NULs are padding some writers leave after an 8-bit packet; the
+  // toolkit ignores them.
+  const bool wide = text.size() >= 2 && (text[0] == '\0' || text[1] == '\0' ||
+                                         static_cast<unsigned char>(text[0]) >= 0xFE);
+  while (!wide && !text.empty() && text.back() == '\0') text.remove_suffix(1);
   if (text.size() > kMaxPacketBytes) {
     if (problem) *problem = "packet larger than " + std::to_string(kMaxPacketBytes >> 20) + " MB";
     return false;
