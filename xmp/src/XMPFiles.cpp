@@ -75,8 +75,8 @@ class Descriptor {
 };
 
 // Dates the toolkit derives from a movie header that holds none.
-bool IsEmptyDerivedValue(const detail::Node& node) {
-  return !(node.options & kXMP_PropCompositeMask) && node.value.rfind("1904-01-01T00:00", 0) == 0;
+bool IsEmptyDerivedValue(const std::string& value, XMP_OptionBits options) {
+  return !(options & kXMP_PropCompositeMask) && value.rfind("1904-01-01T00:00", 0) == 0;
 }
 
 }  // namespace
@@ -155,7 +155,7 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
     if (!s.replacement->Open(s.target, false, &problem)) return s.Refuse(problem);
     if (!s.Examine(s.replacement->ReadFD(), s.replacement->OriginalSize())) return false;
     try {
-      s.stored->Parsed();
+      s.stored->Stored();
     } catch (const XMP_Error&) {
       // XMP nobody can read is never replaced.
       return s.Refuse("its XMP packet cannot be read, so it is left as it is");
@@ -196,7 +196,7 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
 
   XMPMeta shown;
   try {
-    shown = s.stored->Parsed();
+    shown = s.stored->TakeStored();
   } catch (const XMP_Error&) {
     // A packet that does not parse is XMP nobody can read, and that no
     // write may replace.
@@ -213,10 +213,12 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
       xmp_files_free(file);
       if (merged) {
         const XMPMeta view = detail::OwnPacket(merged);
+        std::set<std::pair<std::string, std::string>> stored;
+        for (detail::Key& key : detail::Properties(shown)) stored.emplace(std::move(key.ns), std::move(key.name));
         for (const detail::Key& key : detail::Properties(view)) {
-          if (shown.DoesPropertyExist(key.ns, key.name)) continue;
+          if (stored.count({key.ns, key.name})) continue;
           detail::Node node;
-          if (!detail::ReadNode(view, key.ns, key.name, &node) || IsEmptyDerivedValue(node)) continue;
+          if (!detail::ReadNode(view, key.ns, key.name, &node) || IsEmptyDerivedValue(node.value, node.options)) continue;
           detail::WriteNode(shown, key.ns, key.name, node);
           any = true;
         }
@@ -227,7 +229,7 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
   XMPPacket& packet = detail::Require(xmpObj->GetInternalRef());
   packet.ReplaceXmp(detail::Require(shown.GetInternalRef()).Detach());
   packet.Marks().clear();
-  packet.TrackChanges();
+  packet.TrackChanges(XMPPacket::Tracking::kProperties);
   return true;
 }
 
@@ -238,14 +240,16 @@ void XMPFiles::PutXMP(const XMPMeta& xmpObj) {
   const XMPPacket& packet = detail::Require(xmpObj.GetInternalRef());
   // What to write: the changes since the packet was handed out, or, for a
   // packet from elsewhere, its properties over the stored ones.
+  const std::vector<detail::PropertyText> now = detail::CachedTexts(xmpObj);
   std::vector<detail::Key> changed;
-  if (packet.Tracked()) {
-    if (packet.Baseline()) changed = detail::Differences(detail::OwnPacket(detail::DeepCopy(packet.Baseline())), xmpObj);
+  if (packet.Tracked() == XMPPacket::Tracking::kProperties) {
+    if (const auto* before = packet.BaselineProperties()) changed = detail::Differences(*before, now);
   } else {
-    changed = detail::Properties(xmpObj);
+    for (const detail::PropertyText& p : now)
+      if (p.key.ns != kXMP_NS_Transient) changed.push_back(p.key);
   }
   s.pending = !changed.empty();
-  if (s.pending) s.stored->Apply(xmpObj, changed, s.sidecar ? std::nullopt : s.container->PacketLimit());
+  if (s.pending) s.stored->Apply(xmpObj, now, changed, s.sidecar ? std::nullopt : s.container->PacketLimit());
 }
 
 void XMPFiles::State::Write() {

@@ -7,6 +7,7 @@
 #include <ovraxmp/XMPMeta.h>
 #include <ovraxmp/XMPUtils.h>
 
+#include "XMPNodeTree.h"
 #include "XMPPacket.h"
 #include "files/PacketScan.h"
 
@@ -197,16 +198,62 @@ XmpPtr DeepCopy(XmpPtr xmp) {
   }
   return copy;
 }
+
+BorrowedPacket::BorrowedPacket(XmpPtr xmp) : mPacket(NewPacket(xmp)), mMeta(new XMPMeta(mPacket)) {}
+
+BorrowedPacket::~BorrowedPacket() {
+  mPacket->Detach();
+  delete mMeta;
+  XMPMetaRefRelease(mPacket);
+}
+
+void ParseUnchecked(XMPMeta& meta, const std::string& text) {
+  XMPPacket& packet = Require(meta.GetInternalRef());
+  XmpPtr fresh = xmp_new_empty();
+  if (!fresh) ThrowLastError(kXMPErr_NoMemory, "creating an XMP packet");
+  if (!text.empty() && !xmp_parse(fresh, text.data(), text.size())) {
+    const int id = xmp_get_error();
+    xmp_free(fresh);
+    Throw(id != 0 ? id : kXMPErr_BadParse, "parsing XMP");
+  }
+  packet.BeforeChange();
+  packet.ReplaceXmp(fresh);
+  packet.Marks().clear();
+}
 }  // namespace detail
 
+XMPPacket::~XMPPacket() {
+  if (mXmp) xmp_free(mXmp);
+  if (mBaseline) xmp_free(mBaseline);
+}
+
+void XMPPacket::TrackChanges(Tracking how) noexcept {
+  mTracking = how;
+  if (mBaseline) xmp_free(mBaseline);
+  mBaseline = nullptr;
+  mBaselineTexts.reset();
+}
+
+const std::vector<detail::PropertyText>& XMPPacket::Texts() {
+  if (mTextsVersion != mVersion) {
+    const detail::BorrowedPacket self(mXmp);
+    mTexts = detail::PropertyTexts(self.Meta());
+    mTextsVersion = mVersion;
+  }
+  return mTexts;
+}
+
 void XMPPacket::BeforeChange() {
-  if (mTracked && !mBaseline) mBaseline = detail::DeepCopy(mXmp);
+  if (mTracking == Tracking::kPacket && !mBaseline) mBaseline = detail::DeepCopy(mXmp);
+  if (mTracking == Tracking::kProperties && !mBaselineTexts)
+    mBaselineTexts = std::make_unique<std::vector<detail::PropertyText>>(Texts());
+  ++mVersion;
 }
 
 void XMPPacket::CopyOriginFrom(const XMPPacket& other) {
-  TrackChanges();
-  mTracked = other.mTracked;
+  TrackChanges(other.mTracking);
   if (other.mBaseline) mBaseline = detail::DeepCopy(other.mBaseline);
+  if (other.mBaselineTexts) mBaselineTexts = std::make_unique<std::vector<detail::PropertyText>>(*other.mBaselineTexts);
 }
 
 // ---- whole packet ----

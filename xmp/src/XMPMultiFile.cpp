@@ -18,11 +18,16 @@ const char kDeletedProperties[] = "DeletedProperties";
 
 using Key = std::pair<std::string, std::string>;  // namespace, normalised name
 
-std::map<Key, std::string> PropertiesByKey(const XMPMeta& meta) {
-  std::map<Key, std::string> result;
-  for (const detail::TopLevel& p : detail::TopLevelProperties(meta)) {
-    if (p.ns == kXMP_NS_Transient) continue;
-    result.emplace(Key(p.ns, detail::NormalizedPath(p.ns, p.name)), p.name);
+struct Property {
+  std::string name;          // "prefix:name"
+  const std::string* text;   // see PropertyText, kept by the packet
+};
+
+std::map<Key, Property> PropertiesByKey(const XMPMeta& meta) {
+  std::map<Key, Property> result;
+  for (const detail::PropertyText& p : detail::CachedTexts(meta)) {
+    if (p.key.ns == kXMP_NS_Transient) continue;
+    result.emplace(Key(p.key.ns, detail::NormalizedPath(p.key.ns, p.key.name)), Property{p.key.name, &p.text});
   }
   return result;
 }
@@ -76,9 +81,8 @@ std::string Language(const detail::Node& item) {
 void DistributeLanguages(const XMPPacket& packet, XMPMeta& member, const std::string& ns, const std::string& path,
                          const detail::Node& node) {
   if (!packet.Baseline()) return;  // nothing was edited
-  XMPPacket* baseline = detail::NewPacket(detail::DeepCopy(packet.Baseline()));
-  const XMPMeta before(baseline);
-  XMPMetaRefRelease(baseline);
+  const detail::BorrowedPacket baseline(packet.Baseline());
+  const XMPMeta& before = baseline.Meta();
   detail::Node old;
   detail::ReadNode(before, ns, path, &old);
   XMP_OptionBits options = 0;
@@ -124,17 +128,19 @@ void DistributeNode(const XMPMeta& aggregate, const XMPPacket& packet, XMPMeta& 
 void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_OptionBits) {
   if (!targetPtr) detail::Throw(kXMPErr_BadParam, "no XMP object");
   XMPMeta& target = *targetPtr;
-  detail::Require(target.GetInternalRef());
+  // Collecting builds the aggregate; only what is edited afterwards counts
+  // as a change.
+  detail::Require(target.GetInternalRef()).TrackChanges(XMPPacket::Tracking::kNone);
   detail::Require(source.GetInternalRef());
   std::string countText;
   if (!target.GetProperty(kXMP_NS_Transient, kMultiFileCount, &countText)) {
     for (const auto& entry : PropertiesByKey(source)) {
       detail::Node node;
-      if (detail::ReadNode(source, entry.first.first, entry.second, &node))
+      if (detail::ReadNode(source, entry.first.first, entry.second.name, &node))
         detail::WriteNode(target, entry.first.first, entry.first.second, node);
     }
     target.SetProperty(kXMP_NS_Transient, kMultiFileCount, "1");
-    detail::Require(target.GetInternalRef()).TrackChanges();
+    detail::Require(target.GetInternalRef()).TrackChanges(XMPPacket::Tracking::kPacket);
     return;
   }
   std::int64_t count = 1;
@@ -147,8 +153,8 @@ void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_O
   ConvertFromInt64(count + 1, &next);
   target.SetProperty(kXMP_NS_Transient, kMultiFileCount, next);
 
-  const std::map<Key, std::string> have = PropertiesByKey(target);
-  const std::map<Key, std::string> incoming = PropertiesByKey(source);
+  const std::map<Key, Property> have = PropertiesByKey(target);
+  const std::map<Key, Property> incoming = PropertiesByKey(source);
   for (const auto& entry : have) {
     const std::string& ns = entry.first.first;
     const std::string& name = entry.first.second;
@@ -158,15 +164,16 @@ void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_O
       target.SetMultiValued(ns, name);
       continue;
     }
+    if (*other->second.text == *entry.second.text) continue;  // the same to the last qualifier
     detail::Node mine, theirs;
-    detail::ReadNode(target, ns, entry.second, &mine);
-    detail::ReadNode(source, ns, other->second, &theirs);
+    detail::ReadNode(target, ns, entry.second.name, &mine);
+    detail::ReadNode(source, ns, other->second.name, &theirs);
     Compare(target, ns, name, mine, theirs);
   }
   for (const auto& entry : incoming) {
     if (!have.count(entry.first)) target.SetMultiValued(entry.first.first, entry.first.second);
   }
-  detail::Require(target.GetInternalRef()).TrackChanges();
+  detail::Require(target.GetInternalRef()).TrackChanges(XMPPacket::Tracking::kPacket);
 }
 
 void XMPUtils::MultiFileDistribute(const XMPMeta& aggregate, XMPMeta* memberPtr, XMP_OptionBits) {
@@ -174,9 +181,14 @@ void XMPUtils::MultiFileDistribute(const XMPMeta& aggregate, XMPMeta* memberPtr,
   XMPMeta& member = *memberPtr;
   detail::Require(member.GetInternalRef());
   const XMPPacket& packet = detail::Require(aggregate.GetInternalRef());
+  const std::map<Key, Property> has = PropertiesByKey(member);
   for (const auto& entry : PropertiesByKey(aggregate)) {
+    // A property the member holds as it is needs nothing.
+    const auto same = has.find(entry.first);
+    if (same != has.end() && *same->second.text == *entry.second.text) continue;
+    if (aggregate.IsMultiValued(entry.first.first, entry.first.second)) continue;
     detail::Node node;
-    if (detail::ReadNode(aggregate, entry.first.first, entry.second, &node))
+    if (detail::ReadNode(aggregate, entry.first.first, entry.second.name, &node))
       DistributeNode(aggregate, packet, member, entry.first.first, entry.first.second, node);
   }
   // The deletion records: "prefix:path" of each deleted property.

@@ -126,6 +126,32 @@ bool IsEmptyNode(const Node& node) {
   return node.value.empty();
 }
 
+std::vector<PropertyText> PropertyTexts(const XMPMeta& meta) {
+  std::vector<PropertyText> texts;
+  XmpIteratorPtr it = xmp_iterator_new(Require(meta.GetInternalRef()).Xmp(), nullptr, nullptr, XMP_ITER_PROPERTIES);
+  if (!it) ThrowLastError(kXMPErr_InternalFailure, "starting an iteration");
+  XmpString ns, path, value;
+  std::uint32_t options = 0;
+  while (xmp_iterator_next(it, ns, path, value, &options)) {
+    const std::string_view nodePath(xmp_string_cstr(path), xmp_string_len(path));
+    if (nodePath.empty()) continue;  // a schema node
+    const std::string_view name = nodePath.substr(0, nodePath.find_first_of("/["));
+    if (texts.empty() || texts.back().key.name != name || texts.back().key.ns != xmp_string_cstr(ns))
+      texts.push_back({{xmp_string_cstr(ns), std::string(name)}, std::string()});
+    std::string& text = texts.back().text;
+    text.append(nodePath.substr(name.size()));
+    text += '\x01';
+    text.append(xmp_string_cstr(value), xmp_string_len(value));
+    text += '\x01';
+    text += std::to_string(options & (kXMP_PropCompositeMask | kXMP_PropValueIsURI | kXMP_PropIsQualifier));
+    text += '\x02';
+  }
+  xmp_iterator_free(it);
+  return texts;
+}
+
+const std::vector<PropertyText>& CachedTexts(const XMPMeta& meta) { return Require(meta.GetInternalRef()).Texts(); }
+
 std::vector<TopLevel> TopLevelProperties(const XMPMeta& meta, const std::string& onlyNS) {
   std::vector<TopLevel> result;
   std::vector<std::string> namespaces;

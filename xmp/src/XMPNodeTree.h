@@ -8,6 +8,8 @@
 
 #include <ovraxmp/XMPMeta.h>
 
+#include "XMPPacket.h"
+
 namespace ovraxmp {
 namespace detail {
 
@@ -31,13 +33,14 @@ std::string Canonical(const Node& node);
 // A simple node with an empty value, or a composite node without children.
 bool IsEmptyNode(const Node& node);
 
-// Every top-level property: namespace URI and the property's name with
-// prefix ("dc:title"), in document order.
-struct TopLevel {
-  std::string ns;
-  std::string name;
-};
+// Every top-level property (see TopLevel), in document order.
 std::vector<TopLevel> TopLevelProperties(const XMPMeta& meta, const std::string& onlyNS = std::string());
+
+// Every top-level property in document order with its text (see
+// PropertyText); one walk of the packet. TextsOf keeps the answer in the
+// packet until its content changes.
+std::vector<PropertyText> PropertyTexts(const XMPMeta& meta);
+const std::vector<PropertyText>& CachedTexts(const XMPMeta& meta);
 
 // The path of a child of the node at parentPath.
 std::string ChildPath(const std::string& parentPath, const Node& child);

@@ -5,26 +5,43 @@
 #include <atomic>
 #include <cstdint>
 #include <map>
+#include <memory>
 #include <set>
+#include <vector>
 #include <string>
 #include <utility>
 
 #include <exempi/xmp.h>
 
 #include <ovrametadata/XMPMetaRef.h>
+#include <ovraxmp/XMPMeta.h>
 #include <ovraxmp/XMPError.h>
 
 namespace ovraxmp {
+namespace detail {
+
+// A top-level property: namespace URI and name with prefix ("dc:title").
+struct TopLevel {
+  std::string ns;
+  std::string name;
+};
+
+// A top-level property with a text that is the same for two properties
+// exactly when their subtrees are (names, values, options, qualifiers and
+// items in order).
+struct PropertyText {
+  TopLevel key;
+  std::string text;
+};
+
+}  // namespace detail
 
 // One packet: the toolkit object, its reference count and the in-memory
 // multi-value marks (namespace URI -> normalised property paths).
 class XMPPacket {
  public:
   explicit XMPPacket(XmpPtr xmp) noexcept : mXmp(xmp) {}
-  ~XMPPacket() {
-    if (mXmp) xmp_free(mXmp);
-    if (mBaseline) xmp_free(mBaseline);
-  }
+  ~XMPPacket();
   XMPPacket(const XMPPacket&) = delete;
   XMPPacket& operator=(const XMPPacket&) = delete;
 
@@ -33,10 +50,17 @@ class XMPPacket {
   void ReplaceXmp(XmpPtr xmp) noexcept {
     if (mXmp) xmp_free(mXmp);
     mXmp = xmp;
+    ++mVersion;
   }
   // Hands the toolkit object over; the packet is left empty-handed and may
   // only be destroyed.
-  XmpPtr Detach() noexcept { return std::exchange(mXmp, nullptr); }
+  XmpPtr Detach() noexcept {
+    ++mVersion;
+    return std::exchange(mXmp, nullptr);
+  }
+  // The texts of its top-level properties (see PropertyText), kept until
+  // the content changes.
+  const std::vector<detail::PropertyText>& Texts();
   void AddRef() noexcept { mRefCount.fetch_add(1, std::memory_order_relaxed); }
   // True when this was the last reference (the caller deletes the packet).
   bool Release() noexcept { return mRefCount.fetch_sub(1, std::memory_order_acq_rel) == 1; }
@@ -47,18 +71,16 @@ class XMPPacket {
 
   // A tracked packet remembers what it was at its first change since
   // tracking began, so that only its changes are passed on: a packet handed
-  // out by a file (see XMPFiles), an aggregate of several (see
-  // XMPUtils::MultiFileDistribute).
-  void TrackChanges() noexcept {
-    mTracked = true;
-    if (mBaseline) xmp_free(mBaseline);
-    mBaseline = nullptr;
-  }
-  bool Tracked() const noexcept { return mTracked; }
+  // out by a file keeps its properties' texts (see XMPFiles), an aggregate
+  // of several keeps a copy of itself (see XMPUtils::MultiFileDistribute).
+  enum class Tracking { kNone, kProperties, kPacket };
+  void TrackChanges(Tracking how) noexcept;
+  Tracking Tracked() const noexcept { return mTracking; }
   // Every change of the content goes through here first.
   void BeforeChange();
-  // The content when tracking began; null while it has not changed.
+  // What it was when tracking began; null while it has not changed.
   XmpPtr Baseline() const noexcept { return mBaseline; }
+  const std::vector<detail::PropertyText>* BaselineProperties() const noexcept { return mBaselineTexts.get(); }
   void CopyOriginFrom(const XMPPacket& other);
 
   // The namespace last found registered for this packet (reads repeat it);
@@ -70,8 +92,12 @@ class XMPPacket {
   XmpPtr mXmp;
   std::atomic<std::int32_t> mRefCount{1};
   std::map<std::string, std::set<std::string>> mMarks;
-  bool mTracked = false;
+  std::uint64_t mVersion = 0;  // counts changes of the content
+  std::uint64_t mTextsVersion = ~std::uint64_t(0);
+  std::vector<detail::PropertyText> mTexts;
+  Tracking mTracking = Tracking::kNone;
   XmpPtr mBaseline = nullptr;
+  std::unique_ptr<std::vector<detail::PropertyText>> mBaselineTexts;
 };
 
 namespace detail {
@@ -147,6 +173,25 @@ XmpPtr DeepCopy(XmpPtr xmp);
 
 // A packet that is not null, else kXMPErr_BadObject.
 XMPPacket& Require(XMPMetaRef ref);
+
+// A holder of a toolkit object another packet owns, for reading it through
+// the holder's operations while this object lives.
+class BorrowedPacket {
+ public:
+  explicit BorrowedPacket(XmpPtr xmp);
+  ~BorrowedPacket();
+  BorrowedPacket(const BorrowedPacket&) = delete;
+  BorrowedPacket& operator=(const BorrowedPacket&) = delete;
+  const XMPMeta& Meta() const { return *mMeta; }
+
+ private:
+  XMPPacket* mPacket;
+  XMPMeta* mMeta;
+};
+
+// Parses text into meta without the packet checks, for text that passed
+// them already or that the toolkit itself wrote. Throws XMP_Error.
+void ParseUnchecked(XMPMeta& meta, const std::string& text);
 
 }  // namespace detail
 }  // namespace ovraxmp

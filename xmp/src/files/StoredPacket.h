@@ -4,6 +4,7 @@
 // the file stores at that moment.
 #pragma once
 
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -25,7 +26,7 @@ using Key = TopLevel;
 // Every top-level property but those of the transient namespace.
 std::vector<Key> Properties(const XMPMeta& meta);
 // The top-level properties that differ between two packets.
-std::vector<Key> Differences(const XMPMeta& before, const XMPMeta& after);
+std::vector<Key> Differences(const std::vector<PropertyText>& before, const std::vector<PropertyText>& after);
 // A holder of a fresh toolkit object whose only reference it keeps.
 XMPMeta OwnPacket(XmpPtr xmp);
 
@@ -36,15 +37,19 @@ class StoredPacket {
   StoredPacket(std::optional<std::string> packet, std::optional<std::string> extension);
   bool Exists() const { return mPacket.has_value(); }
   // The stored XMP as readers take it: the extension's properties over the
-  // packet's. Throws XMP_Error when it does not parse or is refused.
-  XMPMeta Parsed() const;
+  // packet's, parsed once. Throws XMP_Error when it does not parse or is
+  // refused. TakeStored hands it over (a later Stored parses again).
+  const XMPMeta& Stored() const;
+  XMPMeta TakeStored();
 
   // Puts the changed properties of source in: each one source holds
   // replaces the stored one, each it lacks is removed. Above limit (the
   // largest packet one place of the format holds) the largest properties
   // move to the extension. Throws XMP_Error when the stored XMP cannot be
   // read or the result does not fit.
-  void Apply(const XMPMeta& source, const std::vector<Key>& changed, std::optional<std::size_t> limit);
+  // texts: source's PropertyTexts.
+  void Apply(const XMPMeta& source, const std::vector<PropertyText>& texts, const std::vector<Key>& changed,
+             std::optional<std::size_t> limit);
   // The packets to write, to try in this order: at the stored packet's
   // length, then grown. Each reads back as intended; throws XMP_Error when
   // none would.
@@ -56,16 +61,20 @@ class StoredPacket {
  private:
   std::vector<std::string> Misread(const std::string& packet) const;
   std::optional<std::string> Render(std::optional<std::size_t> length) const;
-  void Fit(const XMPMeta& stored, std::size_t limit);
+  void Fit(const XMPMeta& source, const XMPMeta& stored, std::size_t limit);
+  void WriteExtension(const XMPMeta& source, const XMPMeta& stored);
   bool InExtension(const Key& key) const;
 
   std::optional<std::string> mPacket, mExtension;
+  mutable std::optional<XMPMeta> mStored;
   std::vector<Key> mExtensionKeys;  // kept in the extension, moved there included
   std::vector<Key> mChanged;
-  std::unique_ptr<PacketEditor> mEditor;                  // the stored packet edited
-  std::optional<std::string> mWhole;                      // or a packet written whole
-  std::optional<XMPMeta> mExpected;                       // what it all must read as
-  std::vector<std::pair<Key, Fragment>> mFragments;       // what the editor puts in
+  // What each changed property must read as (by namespace and name); a
+  // property that goes has no entry.
+  std::map<std::pair<std::string, std::string>, std::string> mIntended;
+  std::unique_ptr<PacketEditor> mEditor;              // the stored packet edited
+  std::optional<std::string> mWhole;                  // or a packet written whole
+  std::vector<std::pair<Key, Fragment>> mFragments;   // what the editor puts in
   std::optional<std::string> mNewExtension;
   std::size_t mGrowthPadding = 2048;
 };
