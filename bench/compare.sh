@@ -13,9 +13,10 @@
 # The corpus is made with ExifTool in a temporary folder, from the bundled
 # samples, with realistic XMP that differs partly from file to file.
 #
-# A last row times bench/set_floor: the toolkit's file handlers alone doing
-# what the library's file provider asks of them, without the safe write, the
-# sync and the aggregate. It shows how fast setting can get on this machine.
+# A last row times bench/set_floor: each file read as the library's file
+# provider reads it and its packet put back at its own place, straight into
+# the file, without the safe write, the sync, the aggregate or any check. It
+# shows how fast setting can get on this machine.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 root=$(pwd)
@@ -165,7 +166,7 @@ printf "%-34s %12s %12s %12s %13sx %11sx\n" "read one property" "$(rate "$read_o
 printf "%-34s %12s %12s %12s %13sx %11sx\n" "show all metadata" "$(rate "$show_o")" "$(rate "$show_e")" "$(rate "$show_x")" "$(ratio "$show_o" "$show_e")" "$(ratio "$show_o" "$show_x")"
 printf "%-34s %12s %12s %12s %13sx %11sx\n" "set one property" "$(rate "$set_o")" "$(rate "$set_e")" "$(rate "$set_x")" "$(ratio "$set_o" "$set_e")" "$(ratio "$set_o" "$set_x")"
 if [ -n "$set_f" ]; then
-  printf "%-34s %12s %12s %12s %13sx %11sx\n" "set, toolkit handlers alone" "$(rate "$set_f")" "" "" "$(ratio "$set_f" "$set_e")" "$(ratio "$set_f" "$set_x")"
+  printf "%-34s %12s %12s %12s %13sx %11sx\n" "set, the floor (bench/set_floor)" "$(rate "$set_f")" "" "" "$(ratio "$set_f" "$set_e")" "$(ratio "$set_f" "$set_x")"
 fi
 echo
 echo "ovrameta wrote the label into $written of $count files; exiv2 read a title from $exiv2_read of $count files."
@@ -173,6 +174,6 @@ if [ -n "$set_f" ]; then
   rm -rf "$work/copy" && cp -a "$work/corpus" "$work/copy"
   (cd "$work/copy" && "$FLOOR" "$cores" "${files[@]}" >/dev/null 2>&1) || true
   floor_written=$(cd "$work/copy" && exiftool -fast -s3 -XMP-xmp:Label "${files[@]}" 2>/dev/null | grep -c '^Reviewed$' || true)
-  echo "The toolkit handlers alone wrote the label into $floor_written of $count files (in place, no sync, no aggregate)."
+  echo "The floor wrote the label into $floor_written of $count files (in place, no sync, no aggregate, no checks)."
 fi
-echo "Targets: read and show at least 10x ExifTool and at least 1x exiv2; set at least 5x ExifTool."
+echo "Targets: read at least 20x ExifTool and 1.5x exiv2; set at least 3x ExifTool."

@@ -175,6 +175,19 @@ TEST(XMPHostileInput, HostileFilesReadAsWithoutXMPAndAreNeverWritten) {
   EXPECT_GE(seen, 8);
 }
 
+TEST(XMPHostileInput, APacketStartWithoutAnEndHungTheScan) {
+  // Found by the fuzzer: the scan for an end marker stopped moving on.
+  ovratest::TempDir dir;
+  const std::string path = (dir / "endless.bin").string();
+  std::filesystem::copy_file(ovratest::DataDir() / "regression" / "packet-without-end.bin", path);
+  ExpectBoundedSuccess(hostile::RunIsolated([&] {
+                         XMPFiles file(path, kXMP_UnknownFile, kRead);
+                         XMPMeta meta;
+                         return file.GetXMP(&meta) ? 1 : 0;
+                       }, 5),
+                       "packet without end");
+}
+
 TEST(XMPFiles, FilesOfTheSameShapesWithSanePacketsAreReadAndWritten) {
   ovratest::TempDir dir;
   const std::string packet = hostile::Packet("<dc:format>image/x-test</dc:format>");

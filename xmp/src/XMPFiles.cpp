@@ -206,11 +206,9 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
   bool any = s.stored->Exists();
   if (!s.sidecar && (!s.stored->Exists() || s.container->HasNativeMetadata())) {
     // The handler's view: the stored packet merged with native metadata.
-    XmpFilePtr file = xmp_files_open_new(s.target.c_str(), XMP_OPEN_READ);
+    const detail::FileHandle file(xmp_files_open_new(s.target.c_str(), XMP_OPEN_READ));
     if (file) {
-      XmpPtr merged = xmp_files_get_new_xmp(file);
-      xmp_files_close(file, XMP_CLOSE_NOOPTION);
-      xmp_files_free(file);
+      XmpPtr merged = xmp_files_get_new_xmp(file.get());
       if (merged) {
         const XMPMeta view = detail::OwnPacket(merged);
         std::set<std::pair<std::string, std::string>> stored;

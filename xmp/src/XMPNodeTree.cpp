@@ -128,11 +128,11 @@ bool IsEmptyNode(const Node& node) {
 
 std::vector<PropertyText> PropertyTexts(const XMPMeta& meta) {
   std::vector<PropertyText> texts;
-  XmpIteratorPtr it = xmp_iterator_new(Require(meta.GetInternalRef()).Xmp(), nullptr, nullptr, XMP_ITER_PROPERTIES);
+  const IteratorHandle it(xmp_iterator_new(Require(meta.GetInternalRef()).Xmp(), nullptr, nullptr, XMP_ITER_PROPERTIES));
   if (!it) ThrowLastError(kXMPErr_InternalFailure, "starting an iteration");
   XmpString ns, path, value;
   std::uint32_t options = 0;
-  while (xmp_iterator_next(it, ns, path, value, &options)) {
+  while (xmp_iterator_next(it.get(), ns, path, value, &options)) {
     const std::string_view nodePath(xmp_string_cstr(path), xmp_string_len(path));
     if (nodePath.empty()) continue;  // a schema node
     const std::string_view name = nodePath.substr(0, nodePath.find_first_of("/["));
@@ -146,7 +146,6 @@ std::vector<PropertyText> PropertyTexts(const XMPMeta& meta) {
     text += std::to_string(options & (kXMP_PropCompositeMask | kXMP_PropValueIsURI | kXMP_PropIsQualifier));
     text += '\x02';
   }
-  xmp_iterator_free(it);
   return texts;
 }
 

@@ -9,6 +9,7 @@
 #include <set>
 #include <vector>
 #include <string>
+#include <type_traits>
 #include <utility>
 
 #include <exempi/xmp.h>
@@ -101,6 +102,19 @@ class XMPPacket {
 };
 
 namespace detail {
+
+// Owners of the toolkit's file and iterator handles.
+struct FileCloser {
+  void operator()(XmpFilePtr file) const noexcept {
+    xmp_files_close(file, XMP_CLOSE_NOOPTION);
+    xmp_files_free(file);
+  }
+};
+using FileHandle = std::unique_ptr<std::remove_pointer_t<XmpFilePtr>, FileCloser>;
+struct IteratorFreer {
+  void operator()(XmpIteratorPtr iterator) const noexcept { xmp_iterator_free(iterator); }
+};
+using IteratorHandle = std::unique_ptr<std::remove_pointer_t<XmpIteratorPtr>, IteratorFreer>;
 
 // Owner of a toolkit string.
 class XmpString {

@@ -100,7 +100,8 @@ class GIFContainer : public Container {
           return std::nullopt;
         return at + hit;
       }
-      at += n > 1 ? n - 1 : n;
+      if (at + n >= file.Size()) break;
+      at += n - 1;
     }
     return std::nullopt;
   }

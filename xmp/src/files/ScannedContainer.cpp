@@ -3,6 +3,7 @@
 // allows writing (end="w") can be written in place, at its own length.
 #include <algorithm>
 #include <cstring>
+#include <iterator>
 
 #include "Container.h"
 #include "PacketScan.h"
@@ -38,6 +39,9 @@ class ScannedContainer : public Container {
     std::uint32_t writable = 0;
     std::string piece;
     std::uint64_t pos = 0;
+    // A start marker with no end behind it means no later one of its kind
+    // has one either: the rest of the file is read once per kind at most.
+    bool endless[std::size(kMarkers)] = {};
     while (pos < file.Size()) {
       const std::uint64_t n = std::min<std::uint64_t>(kPiece, file.Size() - pos);
       piece = file.ReadText(pos, n);
@@ -46,7 +50,7 @@ class ScannedContainer : public Container {
         const Marker* marker = nullptr;
         for (const Marker& m : kMarkers)
           if (piece.compare(i, m.startLength, m.start, m.startLength) == 0) marker = &m;
-        if (!marker) {
+        if (!marker || endless[marker - kMarkers]) {
           ++i;
           continue;
         }
@@ -54,8 +58,10 @@ class ScannedContainer : public Container {
         const std::uint64_t start = pos + i;
         const std::optional<Extent> extent = PacketAt(file, start, *marker);
         if (!extent) {
+          endless[marker - kMarkers] = true;
+          --packets;  // no end: no packet the toolkit would take either
           ++i;
-          continue;  // no end: no packet the toolkit would take either
+          continue;
         }
         const std::string text = file.ReadText(extent->offset, extent->length);
         std::string why;
@@ -96,7 +102,8 @@ class ScannedContainer : public Container {
         }
         return Extent{start, end - start};
       }
-      if (n < marker.endLength) break;
+      // Pieces overlap by the marker's length, so that none is missed.
+      if (at + n >= file.Size()) break;
       at += n - marker.endLength;
     }
     return std::nullopt;
