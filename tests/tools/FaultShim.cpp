@@ -103,34 +103,26 @@ static int OpenCommon(int dirfd, const char* path, int flags, mode_t mode, int a
 
 extern "C" {
 
-int open(const char* path, int flags, ...) {
-  mode_t mode = 0;
-  if (flags & (O_CREAT | __O_TMPFILE)) {
-    va_list args;
-    va_start(args, flags);
-    mode = static_cast<mode_t>(va_arg(args, int));
-    va_end(args);
+// The mode argument an open that makes a file carries.
+#define MODE_OF(flags)                                       \
+  mode_t mode = 0;                                           \
+  if ((flags) & (O_CREAT | __O_TMPFILE)) {                   \
+    va_list args;                                            \
+    va_start(args, flags);                                   \
+    mode = static_cast<mode_t>(va_arg(args, int));           \
+    va_end(args);                                            \
   }
+
+int open(const char* path, int flags, ...) {
+  MODE_OF(flags)
   return OpenCommon(AT_FDCWD, path, flags, mode, 0);
 }
 int open64(const char* path, int flags, ...) {
-  mode_t mode = 0;
-  if (flags & (O_CREAT | __O_TMPFILE)) {
-    va_list args;
-    va_start(args, flags);
-    mode = static_cast<mode_t>(va_arg(args, int));
-    va_end(args);
-  }
+  MODE_OF(flags)
   return OpenCommon(AT_FDCWD, path, flags, mode, 0);
 }
 int openat(int dirfd, const char* path, int flags, ...) {
-  mode_t mode = 0;
-  if (flags & (O_CREAT | __O_TMPFILE)) {
-    va_list args;
-    va_start(args, flags);
-    mode = static_cast<mode_t>(va_arg(args, int));
-    va_end(args);
-  }
+  MODE_OF(flags)
   return OpenCommon(dirfd, path, flags, mode, 1);
 }
 

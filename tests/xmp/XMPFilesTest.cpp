@@ -188,6 +188,18 @@ TEST(XMPHostileInput, APacketStartWithoutAnEndHungTheScan) {
                        "packet without end");
 }
 
+TEST(XMPHostileInput, AWebPWithWaveChunksLeakedInTheToolkitsHandler) {
+  // Found by the fuzzer (the leak shows under AddressSanitizer): the toolkit's
+  // handler is not asked about a file whose layout the layer knows and
+  // which holds neither XMP nor native metadata.
+  ovratest::TempDir dir;
+  const std::string path = (dir / "odd.webp").string();
+  std::filesystem::copy_file(ovratest::DataDir() / "regression" / "webp-with-wave-chunks.webp", path);
+  XMPFiles file(path, kXMP_UnknownFile, kRead);
+  XMPMeta meta;
+  EXPECT_FALSE(file.GetXMP(&meta));
+}
+
 TEST(XMPFiles, FilesOfTheSameShapesWithSanePacketsAreReadAndWritten) {
   ovratest::TempDir dir;
   const std::string packet = hostile::Packet("<dc:format>image/x-test</dc:format>");

@@ -204,7 +204,9 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
     return false;
   }
   bool any = s.stored->Exists();
-  if (!s.sidecar && (!s.stored->Exists() || s.container->HasNativeMetadata())) {
+  // Only where there is native metadata, or where the layer does not know
+  // the layout, does the toolkit's handler add anything.
+  if (!s.sidecar && (s.container->HasNativeMetadata() || !s.container->KnowsLayout())) {
     // The handler's view: the stored packet merged with native metadata.
     const detail::FileHandle file(xmp_files_open_new(s.target.c_str(), XMP_OPEN_READ));
     if (file) {
