@@ -7,6 +7,7 @@
 
 #include <gtest/gtest.h>
 
+#include "../../xmp/src/files/Container.h"
 #include "../../xmp/src/files/PacketScan.h"
 #include "HostileInputs.h"
 #include "XMPMediaFiles.h"
@@ -129,7 +130,7 @@ const FileCase kHostileFiles[] = {
      [] {
        const std::string png = xmptest::media::Png();
        const std::string itxt = xmptest::media::PngChunk(
-           "iTXt", std::string("XML:com.adobe.xmp\0\0\0\0\0", 22) + hostile::Wrapped(hostile::DeepResources(100000)));
+           "iTXt", detail::PNGPacketKeyword() + std::string(5, '\0') + hostile::Wrapped(hostile::DeepResources(100000)));
        return png.substr(0, 33) + itxt + png.substr(33);
      }},
 };

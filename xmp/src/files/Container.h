@@ -143,6 +143,9 @@ class Container {
 // finds packets by their markers.
 std::unique_ptr<Container> ContainerFor(const FileReader& file);
 
+// The keyword of the PNG text chunk that carries XMP.
+const std::string& PNGPacketKeyword();
+
 std::unique_ptr<Container> MakeJPEGContainer();
 std::unique_ptr<Container> MakePNGContainer();
 std::unique_ptr<Container> MakeTIFFContainer();

@@ -1,16 +1,32 @@
 // PNG: a chain of chunks, each with its own checksum. XMP lives in an
-// uncompressed iTXt chunk with the keyword "XML:com.adobe.xmp".
+// uncompressed iTXt chunk whose keyword names the XMP namespace's host.
 #include <cstring>
 
 #include <boost/crc.hpp>
+
+#include <ovraxmp/XMPConsts.h>
 
 #include "Container.h"
 
 namespace ovraxmp {
 namespace detail {
+// "XML:", the host of the XMP namespaces with its labels reversed and
+// without "ns", ".xmp".
+const std::string& PNGPacketKeyword() {
+  static const std::string keyword = [] {
+    const std::string uri = kXMP_NS_XMP;
+    const std::size_t hostStart = uri.find("//") + 2;
+    std::string host = uri.substr(hostStart, uri.find('/', hostStart) - hostStart);
+    std::string reversed;
+    for (std::size_t dot; (dot = host.rfind('.')) != std::string::npos; host.erase(dot))
+      reversed += host.substr(dot + 1) + ".";
+    return "XML:" + reversed + "xmp";
+  }();
+  return keyword;
+}
+
 namespace {
 
-const char kKeyword[] = "XML:com.adobe.xmp";  // + NUL
 
 class PNGContainer : public Container {
  public:
@@ -30,7 +46,8 @@ class PNGContainer : public Container {
         if (std::memcmp(head + 4, "IHDR", 4) != 0) return Refuse(problem, "no header chunk");
         mInsertAt = pos + 12 + length;
       }
-      if (std::memcmp(head + 4, "iTXt", 4) == 0 && length > sizeof kKeyword && !mPacket && !mCompressed) {
+      if (std::memcmp(head + 4, "iTXt", 4) == 0 && length > PNGPacketKeyword().size() + 1 && !mPacket &&
+          !mCompressed) {
         if (!TakeText(file, pos + 8, length, problem)) return false;
         if (mPacket) mChunk = {pos, 12 + length};
       }
@@ -45,9 +62,8 @@ class PNGContainer : public Container {
                  std::string* problem) const override {
     if (mCompressed) return Refuse(problem, "its XMP is compressed and is not written");
     // iTXt: keyword, no compression, no language, no translated keyword.
-    std::string chunk = "iTXt";
-    chunk.append(kKeyword, sizeof kKeyword);
-    chunk.append(4, '\0');
+    std::string chunk = "iTXt" + PNGPacketKeyword();
+    chunk.append(5, '\0');
     chunk += packet;
     if (chunk.size() - 4 > 0x7FFFFFFFu) return Refuse(problem, "the XMP packet is too large for a chunk");
     boost::crc_32_type crc;
@@ -63,9 +79,13 @@ class PNGContainer : public Container {
   // The text of an iTXt chunk that carries XMP: keyword, compression flag
   // and method, language and translated keyword, each text NUL-ended.
   bool TakeText(const FileReader& file, std::uint64_t data, std::uint64_t length, std::string* problem) {
-    char keyword[sizeof kKeyword];
-    if (!file.Read(data, keyword, sizeof keyword) || std::memcmp(keyword, kKeyword, sizeof kKeyword) != 0) return true;
-    const std::string rest = file.ReadText(data + sizeof kKeyword, length - sizeof kKeyword);
+    const std::string& expected = PNGPacketKeyword();
+    const std::size_t keywordSize = expected.size() + 1;  // with its NUL
+    std::string keyword(keywordSize, '\0');
+    if (!file.Read(data, keyword.data(), keywordSize) || keyword.compare(0, expected.size(), expected) != 0 ||
+        keyword.back() != '\0')
+      return true;
+    const std::string rest = file.ReadText(data + keywordSize, length - keywordSize);
     if (rest.size() < 2) return true;
     if (rest[0] != 0) {
       mCompressed = true;
@@ -74,7 +94,7 @@ class PNGContainer : public Container {
     const std::size_t language = rest.find('\0', 2);
     const std::size_t translated = language == std::string::npos ? language : rest.find('\0', language + 1);
     if (translated == std::string::npos) return true;
-    const std::uint64_t start = data + sizeof kKeyword + translated + 1;
+    const std::uint64_t start = data + keywordSize + translated + 1;
     return TakePacket(file, {start, data + length - start}, problem);
   }
 
