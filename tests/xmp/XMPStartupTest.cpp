@@ -49,26 +49,6 @@ TEST(XMPPacketHandle, PacketLivesUntilItsLastReference) {
   XMPMetaRefRelease(ref);  // the last one; the sanitizer build checks the free
 }
 
-TEST(XMPPacketHandle, NullHandleMeansNoPacket) {
-  XMPMetaRefAddRef(nullptr);
-  XMPMetaRefRelease(nullptr);
-  XMPMeta none(nullptr);
-  EXPECT_EQ(none.GetInternalRef(), nullptr);
-  EXPECT_EQ(XMPMetaRefGetCount(nullptr), 0);
-  XMPMeta copy(none);
-  EXPECT_EQ(copy.GetInternalRef(), nullptr);
-}
-
-TEST(XMPError, CarriesIdAndReadableMessage) {
-  const XMP_Error withText(kXMPErr_BadSchema, "no such namespace");
-  EXPECT_EQ(withText.GetID(), -101);
-  EXPECT_STREQ(withText.GetErrMsg(), "no such namespace");
-  EXPECT_STREQ(withText.what(), "no such namespace");
-  const XMP_Error standard(kXMPErr_BadParse, "");
-  EXPECT_EQ(standard.GetID(), -106);
-  EXPECT_STREQ(standard.what(), "XMP parsing failure");
-}
-
 TEST(XMPNamespaces, RegisterAnswersWhetherTheSuggestedPrefixWasGiven) {
   std::string registered;
   EXPECT_TRUE(XMPMeta::RegisterNamespace("http://ovra.test/ns/one/", "ovone", &registered));

@@ -93,27 +93,6 @@ TEST_F(XMPUtilsTest, SeparateSplitsTrimsHonoursQuotesAndReplacesItems) {
   EXPECT_EQ(meta.CountArrayItems(kTestNS, "Seq"), 0);
 }
 
-TEST_F(XMPUtilsTest, SeparatingTheCatenationGivesTheSameItems) {
-  std::mt19937 random(20240305);
-  const std::vector<std::string> alphabet = {"a", "b", " ", ";", ",", "\"", "\t", "\xC3\xA9", "x"};
-  for (int round = 0; round < 300; ++round) {
-    std::vector<std::string> items(1 + random() % 5);
-    for (std::string& item : items) {
-      const std::size_t length = random() % 7;
-      for (std::size_t i = 0; i < length; ++i) item += alphabet[random() % alphabet.size()];
-    }
-    const bool commas = round % 2 == 0;
-    XMPMeta meta;
-    for (const std::string& item : items) meta.AppendArrayItem(kTestNS, "Bag", kXMP_PropArrayIsOrdered, item);
-    std::string text;
-    XMPUtils::CatenateArrayItems(meta, kTestNS, "Bag", commas ? ", " : "; ", "\"",
-                                 commas ? kXMPUtil_AllowCommas : 0, &text);
-    XMPMeta back;
-    XMPUtils::SeparateArrayItems(&back, kTestNS, "Bag", commas ? kXMPUtil_AllowCommas : 0, text);
-    ASSERT_EQ(Items(back, kTestNS, "Bag"), items) << "catenated: [" << text << "]";
-  }
-}
-
 TEST_F(XMPUtilsTest, TemplateFlagsEachDoTheirPart) {
   const auto working = [] {
     XMPMeta meta;
