@@ -181,11 +181,14 @@ bool FileReplacement::Open(const std::string& utf8Path, bool mayCreate, std::str
       return Fail("cannot open the file", errno, problem);
     }
     struct stat info {};
-    if (::fstat(fd, &info) != 0 || !S_ISREG(info.st_mode)) {
+    if (::fstat(fd, &info) != 0) {
       const int error = errno;
       ::close(fd);
-      return Fail(S_ISREG(info.st_mode) ? "cannot examine the file" : "not a regular file",
-                  S_ISREG(info.st_mode) ? error : 0, problem);
+      return Fail("cannot examine the file", error, problem);
+    }
+    if (!S_ISREG(info.st_mode)) {
+      ::close(fd);
+      return Fail("not a regular file", 0, problem);
     }
     if (::faccessat(AT_FDCWD, path.c_str(), W_OK, AT_EACCESS) != 0 ||
         (::geteuid() == 0 && (info.st_mode & 0222) == 0)) {
