@@ -16,13 +16,10 @@
 #include <system_error>
 
 #include <ovracore/SafeWrite.h>
-#include <ovraxmp/XMPIterator.h>
-#include <ovraxmp/XMPUtils.h>
 
 #include "XMPNodeTree.h"
 #include "XMPPacket.h"
 #include "files/Container.h"
-#include "files/PacketScan.h"
 #include "files/StoredPacket.h"
 
 namespace ovraxmp {

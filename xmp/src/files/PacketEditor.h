@@ -55,8 +55,6 @@ class PacketEditor {
     std::size_t at, length;
     std::string text;
   };
-  void PlanDescriptionInsert(std::size_t description, const Fragment& fragment, std::vector<Change>* changes,
-                             std::vector<std::map<std::string, std::string>>* scopes) const;
   std::string Indentation(std::size_t at) const;
 
   std::string mText;

@@ -4,7 +4,6 @@
 #include <algorithm>
 #include <map>
 
-#include <ovraxmp/XMPUtils.h>
 
 #include "../XMPPacket.h"
 #include "Container.h"
