@@ -9,6 +9,7 @@
 #include "DefinitionsRegistryInternal.h"
 #include "InitializeInternal.h"
 #include "format/FormatInternal.h"
+#include "views/ViewsInternal.h"
 
 namespace ovrametadata {
 
@@ -81,6 +82,8 @@ UTF8String AskVersionInfo() {
 
 bool IsLibraryInitialized() { return sInitializationCount != 0; }
 
+const ovracore::ResourceTable* LibraryResources() { return IsLibraryInitialized() ? sModule : nullptr; }
+
 void Initialize() {
   if (sInitializationCount++ != 0) return;
   ovracore::LogTimeMark(kStartupTimeCategory, "Start Initializing ovrametadata");
@@ -119,8 +122,8 @@ void Terminate() {
   // packages are cleared here, before the error list.
   ClearErrorList();
   ClearFormatterTables();
-  // Place of the view subsystem's shutdown: the common view definitions and
-  // their load count are cleared here, before the definitions.
+  // Views point into the definitions, so they go first.
+  ClearViewDefinitions();
   ClearDefinitionsRegistry();
 
   ovraxmp::XMPFiles::Terminate();

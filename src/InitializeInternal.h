@@ -17,6 +17,8 @@ namespace ovrametadata {
 // True between the first Initialize and the last Terminate; every table
 // answers nothing while it is false.
 bool IsLibraryInitialized();
+// The library's own resources while it is initialised, else null.
+const ovracore::ResourceTable* LibraryResources();
 
 // --- Error and switch state (Errors.cpp, Switches.cpp).
 // Drop the withdrawn (emptied) entries of a callback list.

@@ -52,7 +52,15 @@ void Attributes::Add(UTF8String namespaceURI, UTF8String localName, UTF8String v
   entry.namespaceURI = Own(std::move(namespaceURI));
   entry.localName = Own(std::move(localName));
   entry.value = Own(std::move(value));
+  entry.position = mEntries.size();
   mEntries.insert(it, entry);
+}
+
+std::vector<Attributes::Entry> Attributes::InDocumentOrder() const {
+  std::vector<Entry> ordered(mEntries);
+  std::sort(ordered.begin(), ordered.end(),
+            [](const Entry& a, const Entry& b) { return a.position < b.position; });
+  return ordered;
 }
 
 const Attributes::Entry* Attributes::Lookup(std::string_view localName,
@@ -139,7 +147,7 @@ class AttributesFiller {
     for (const XML_Char** a = atts; a && *a; a += 2) {
       const std::string_view full(a[0]);
       const std::size_t sep = full.find(kNamespaceSeparator);
-      Attributes::Entry entry{{}, full, a[1] ? a[1] : ""};
+      Attributes::Entry entry{{}, full, a[1] ? a[1] : "", entries.size()};
       if (sep != std::string_view::npos) {
         entry.namespaceURI = full.substr(0, sep);
         entry.localName = full.substr(sep + 1);

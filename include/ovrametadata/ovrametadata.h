@@ -10,3 +10,4 @@
 #include <ovrametadata/Format.h>
 #include <ovrametadata/Providers.h>
 #include <ovrametadata/MetadataUtils.h>
+#include <ovrametadata/Views.h>

@@ -26,6 +26,7 @@ class Attributes {
     std::string_view namespaceURI;
     std::string_view localName;
     std::string_view value;
+    std::size_t position = 0;  // in the start tag, counted from 0
   };
 
   Attributes() = default;
@@ -45,6 +46,9 @@ class Attributes {
   // Every attribute, ordered by namespace URI and then local name. The views
   // live as long as this object (or, in a handler, the call).
   const std::vector<Entry>& All() const { return mEntries; }
+  // The same entries in the order the start tag lists them, for readers whose
+  // later attributes override earlier ones.
+  std::vector<Entry> InDocumentOrder() const;
   bool Empty() const { return mEntries.empty(); }
 
  private:
