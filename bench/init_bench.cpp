@@ -1,17 +1,20 @@
 // Start-up and the definitions parser.
 // Targets: Initialize + Terminate with the built-in resources and 20 custom
 // definitions files of 50 properties each under 5 ms; the parser reads at
-// least 20 MB/s of definitions XML.
+// least 20 MB/s of definitions XML; start-up with the built-in views loaded
+// under 5 ms.
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <string>
 
 #include <benchmark/benchmark.h>
+#include <boost/range/size.hpp>
 #include <unistd.h>
 
 #include <ovrametadata/Definitions.h>
 #include <ovrametadata/Initialize.h>
+#include <ovrametadata/Views.h>
 
 namespace {
 
@@ -60,20 +63,22 @@ std::string DefinitionsFile(int file, int properties) {
 // Private data roots holding the custom definitions files, removed at exit.
 class CustomFolders {
  public:
-  CustomFolders() {
+  explicit CustomFolders(int files) {
     std::string pattern = (fs::temp_directory_path() / "ovrabench-XXXXXX").string();
     if (!mkdtemp(pattern.data())) std::abort();
     mRoot = pattern;
     fs::create_directories(mRoot / "user");
     fs::create_directories(mRoot / "local");
-    setenv("OVRAMETADATA_USER_ROOT", (mRoot / "user").c_str(), 1);
-    setenv("OVRAMETADATA_LOCAL_ROOT", (mRoot / "local").c_str(), 1);
     const fs::path custom = mRoot / "user" / "Orlex/XMP/Custom Propsheet Panels/4.0/custom";
     fs::create_directories(custom);
-    for (int file = 0; file < kCustomFiles; ++file) {
+    for (int file = 0; file < files; ++file) {
       std::ofstream out(custom / ("Bench" + std::to_string(file) + ".xml"), std::ios::binary);
       out << DefinitionsFile(file, kPropertiesPerFile);
     }
+  }
+  void Use() const {
+    setenv("OVRAMETADATA_USER_ROOT", (mRoot / "user").c_str(), 1);
+    setenv("OVRAMETADATA_LOCAL_ROOT", (mRoot / "local").c_str(), 1);
   }
   ~CustomFolders() {
     std::error_code ec;
@@ -84,7 +89,14 @@ class CustomFolders {
   fs::path mRoot;
 };
 
-void EnsureCustomFolders() { static CustomFolders folders; }
+void EnsureCustomFolders() {
+  static const CustomFolders folders(kCustomFiles);
+  folders.Use();
+}
+void EnsureEmptyFolders() {
+  static const CustomFolders folders(0);
+  folders.Use();
+}
 
 void BM_InitializeTerminate(benchmark::State& state) {
   EnsureCustomFolders();
@@ -102,6 +114,23 @@ void BM_InitializeTerminate(benchmark::State& state) {
   }
 }
 BENCHMARK(BM_InitializeTerminate)->Unit(benchmark::kMillisecond);
+
+// What a panel host does before it shows its first panel: the built-in
+// definitions and views, no custom files.
+void BM_InitializeWithViews(benchmark::State& state) {
+  EnsureEmptyFolders();
+  std::size_t views = 0;
+  for (auto _ : state) {
+    Initialize();
+    LoadAllViewDefinitions();
+    state.PauseTiming();
+    views = static_cast<std::size_t>(boost::size(CommonViewDefinitions()));
+    Terminate();
+    state.ResumeTiming();
+  }
+  if (views < 10) state.SkipWithError("the built-in views were not loaded");
+}
+BENCHMARK(BM_InitializeWithViews)->Unit(benchmark::kMillisecond);
 
 void BM_ParseDefinitions(benchmark::State& state) {
   std::string buffer;

@@ -85,6 +85,9 @@ OVRAMETADATA_EXPORT ViewDefinitionPtr GetViewDefinitionForName(const UTF8String&
 // Registers a view. False for null and for a name already registered (the
 // first one stays; the duplicate is reported with `source` as context).
 OVRAMETADATA_EXPORT bool AddViewDefinition(ViewDefinitionPtr def, UTF16String source);
+// The source a registered view came with (a resource name or a file's path);
+// empty for a view that is not registered.
+OVRAMETADATA_EXPORT UTF16String ViewDefinitionSource(const ViewDefinitionPtr& def);
 // Walks def for builder: BeginView, BuildItem per top-level item, EndView.
 // Nothing happens for null.
 OVRAMETADATA_EXPORT void BuildView(ViewDefinitionPtr def, ViewBuilderInterface& builder);

@@ -6,7 +6,6 @@
 #include <utility>
 
 #include <boost/algorithm/string/predicate.hpp>
-#include <boost/algorithm/string/split.hpp>
 #include <boost/make_shared.hpp>
 
 #include <ovracore/Localizer.h>
@@ -34,11 +33,20 @@ const char* const kInvalidPrefix =
 unsigned sLoadCount = 0;
 
 // Splits at runs of one separator; the parts between runs may be empty only
-// at either end.
-std::vector<UTF8String> SplitAtRuns(const UTF8String& text, char separator) {
-  std::vector<UTF8String> parts;
-  boost::split(parts, text, [separator](char c) { return c == separator; }, boost::token_compress_on);
-  return parts;
+// at either end. Views of text, which outlives them.
+std::vector<std::string_view> SplitAtRuns(std::string_view text, char separator) {
+  std::vector<std::string_view> parts;
+  std::size_t start = 0;
+  while (true) {
+    const std::size_t end = text.find(separator, start);
+    parts.push_back(text.substr(start, end == std::string_view::npos ? std::string_view::npos : end - start));
+    if (end == std::string_view::npos) return parts;
+    start = text.find_first_not_of(separator, end);
+    if (start == std::string_view::npos) {
+      parts.emplace_back();
+      return parts;
+    }
+  }
 }
 
 std::vector<ViewDefinitionPtr> Parse(const UTF16String& source,
@@ -281,7 +289,7 @@ void ViewDefinitionsHandler::HandleItem(const UTF8String& elementWidget, const o
 
 bool ViewDefinitionsHandler::ResolveQualifiedName(const UTF8String& value, UTF8String& namespaceURI,
                                                   UTF8String& localName) {
-  const std::vector<UTF8String> parts = SplitAtRuns(value, ':');
+  const std::vector<std::string_view> parts = SplitAtRuns(value, ':');
   if (parts.size() < 2) {
     Report(ovracore::ZString(kInvalidPrefix, {value}));
     return false;
@@ -298,10 +306,10 @@ bool ViewDefinitionsHandler::ResolveQualifiedName(const UTF8String& value, UTF8S
 }
 
 Path ViewDefinitionsHandler::PathForQualifiedName(const UTF8String& value) {
-  const std::vector<UTF8String> parts = SplitAtRuns(value, '/');
+  const std::vector<std::string_view> parts = SplitAtRuns(value, '/');
   UTF8String uri, local;
   if (parts.size() == 2 && !parts[0].empty() && !parts[1].empty()) {
-    if (!ResolveQualifiedName(parts[0], uri, local)) return {};
+    if (!ResolveQualifiedName(UTF8String(parts[0]), uri, local)) return {};
     const Path structure = PathForSchemaNameAndPropertyName(uri, local);
     if (structure.description.empty()) {
       Report(ovracore::ZString(
@@ -312,7 +320,7 @@ Path ViewDefinitionsHandler::PathForQualifiedName(const UTF8String& value) {
     }
     Path field;
     UTF8String fieldURI, fieldName;
-    if (ResolveQualifiedName(parts[1], fieldURI, fieldName)) {
+    if (ResolveQualifiedName(UTF8String(parts[1]), fieldURI, fieldName)) {
       const boost::shared_ptr<FieldDefinition> definition =
           FieldNameDefinition(TypeEntryDefinition(structure), fieldName);
       if (definition && definition->namespaceURI == fieldURI) field = CreatePathFromStructureField(structure, definition);

@@ -15,6 +15,8 @@ namespace {
 // Filled at start-up, read afterwards; a host that registers views later
 // must not let that overlap with lookups, hence no lock.
 std::vector<ViewDefinitionPtr> sViewDefinitions;
+// Where each view came from, by position in the list.
+std::vector<UTF16String> sViewSources;
 
 UTF16String ItemText(const UTF8String& own, const Path& path, UTF16String LocalizedDefinition::*field) {
   if (!own.empty()) return ovracore::ZString(own);
@@ -59,7 +61,14 @@ bool AddViewDefinition(ViewDefinitionPtr def, UTF16String source) {
     return false;
   }
   sViewDefinitions.push_back(std::move(def));
+  sViewSources.push_back(std::move(source));
   return true;
+}
+
+UTF16String ViewDefinitionSource(const ViewDefinitionPtr& def) {
+  for (std::size_t i = 0; i < sViewDefinitions.size(); ++i)
+    if (sViewDefinitions[i] == def) return sViewSources[i];
+  return {};
 }
 
 void BuildView(ViewDefinitionPtr def, ViewBuilderInterface& builder) {
@@ -77,6 +86,7 @@ void BuildView(ViewDefinitionPtr def, ViewBuilderInterface& builder) {
 
 void ClearViewDefinitions() {
   sViewDefinitions.clear();
+  sViewSources.clear();
   ResetViewLoadCount();
 }
 

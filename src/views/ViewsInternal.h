@@ -74,7 +74,7 @@ class ViewDefinitionsHandler : public ovracore::AbstractParseHandler {
   ViewItemPtr currentItem;
   // Each prefix's declarations, innermost last, so that the end of an inner
   // declaration brings the outer one back.
-  std::map<UTF8String, std::vector<UTF8String>> prefixMap;
+  std::map<UTF8String, std::vector<UTF8String>, std::less<>> prefixMap;
   bool nameRequired = false;
   UTF16String source;
 };

@@ -21,33 +21,60 @@ namespace {
 using namespace ovratest::tool;
 using OvrametaTest = ToolTest;
 
-TEST_F(OvrametaTest, ShowPhotoListsCameraGpsAndIptcValuesUnderSchemaLabels) {
+TEST_F(OvrametaTest, ShowListsValuesThroughTheViewsThenEveryOtherSchemaEachOnce) {
   Sample("harbour.jpg");
   const Result result = Run({"show", "harbour.jpg"});
   ASSERT_EQ(result.status, 0) << result.err;
-  ExpectContains(result.out, {"Dublin Core\n", "  Title: Harbour at dawn\n"});
-  // Arrays as their items, structures indented by field.
-  ExpectContains(result.out, {"  Keywords:\n    - harbour\n    - dawn\n    - boats\n",
-                              "  Flash:\n    Fired: Did not fire\n", "  Make: Orlex\n",
-                              "  GPS Latitude: 37\xC2\xB0 46' 30", "  Country Code: US\n",
-                              "  Creator Contact Info:\n    City: San Francisco\n"});
-  // Closed choices show the label of the stored value.
-  ExpectContains(result.out, {"  Rating: Four Stars\n"});
-  // A schema without values is not shown.
-  EXPECT_EQ(result.out.find("XMP Dynamic Media"), std::string::npos);
-}
+  ExpectContains(result.out, {"Description\n  Title: Harbour at dawn\n",
+                              "  Keywords:\n    - harbour\n    - dawn\n    - boats\n  Rating: Four Stars\n",
+                              "  Flash\n    Fired: Did not fire\n", "    Make: Orlex\n",
+                              "    Latitude: 37\xC2\xB0 46' 30", "    ISO Country Code: US\n",
+                              "    Creator Contact Info\n      City: San Francisco\n",
+                              // What no view shows comes under its schema.
+                              "EXIF\n  EXIF Version: EXIF 2.32\n"});
+  // Each value once, no empty items, notes or separators.
+  EXPECT_EQ(result.out.find("Title: Harbour at dawn"), result.out.rfind("Title: Harbour at dawn"));
+  EXPECT_EQ(result.out.find("--"), std::string::npos);
+  EXPECT_EQ(result.out.find("Copyright Status"), std::string::npos);
+  EXPECT_EQ(result.out.find("Video"), std::string::npos);
 
-TEST_F(OvrametaTest, ShowClipAndRecordingListDynamicMediaValues) {
   Sample("interview.mp4");
   Sample("ambience.wav");
   const Result clip = Run({"show", "interview.mp4"});
   ASSERT_EQ(clip.status, 0) << clip.err;
-  ExpectContains(clip.out, {"XMP Dynamic Media\n", "  Scene: 12\n", "  Duration:\n    Value: 12000\n",
-                            "  Markers:\n    [1]\n", "      Comment: Boat enters\n"});
-
+  ExpectContains(clip.out, {"Video\n  Shot\n    Scene: 12\n", "    Duration:\n      Value: 12000\n",
+                            "    Markers:\n      [1]\n", "        Comment: Boat enters\n"});
   const Result recording = Run({"show", "ambience.wav"});
   ASSERT_EQ(recording.status, 0) << recording.err;
-  ExpectContains(recording.out, {"  Album: Harbour sounds\n", "  Title: Harbour ambience\n"});
+  ExpectContains(recording.out, {"    Album: Harbour sounds\n", "  Title: Harbour ambience\n"});
+}
+
+TEST_F(OvrametaTest, ShowViewLaysOutOneViewAndViewsListsThem) {
+  Sample("harbour.jpg");
+  const Result view = Run({"show", "--view", "Description", "harbour.jpg"});
+  ASSERT_EQ(view.status, 0) << view.err;
+  ExpectContains(view.out, {"Description\n  Title: Harbour at dawn\n",
+                            "    - boats\n  Each keyword is kept as an entry of its own.\n  --\n",
+                            "  Label: Selected\n  --\n  Copyright\n    Copyright Status:\n"});
+
+  Sample("interview.mp4", "a.mp4");
+  Sample("interview.mp4", "b.mp4");
+  ASSERT_EQ(Run({"set", "b.mp4", "xmpDM:scene=7"}).status, 0);
+  const Result mixed = Run({"show", "--view", "Video", "a.mp4", "b.mp4"});
+  ASSERT_EQ(mixed.status, 0) << mixed.err;
+  ExpectContains(mixed.out, {"    Scene: (mixed)\n", "    Shot Name: Pier wide\n"});
+
+  const Result unknown = Run({"show", "--view", "Nothing", "harbour.jpg"});
+  EXPECT_EQ(unknown.status, 2);
+  ExpectContains(unknown.err, {"no view is named \"Nothing\""});
+
+  const Result list = Run({"views"});
+  ASSERT_EQ(list.status, 0) << list.err;
+  ExpectContains(list.out, {"CameraData  Camera Data  built-in", "Description  Description  built-in"});
+  const Result layout = Run({"views", "Description"});
+  ASSERT_EQ(layout.status, 0) << layout.err;
+  ExpectContains(layout.out, {"  property xmp:Label  \"Label\"  choices: Red=Red", "  separator\n",
+                              "  section  \"Copyright\"\n    property xmpRights:Marked"});
 }
 
 TEST_F(OvrametaTest, ShowOfSeveralFilesMarksDifferingValuesAsMixed) {

@@ -204,6 +204,8 @@ TEST_F(Views, RegistryKeepsTheFirstOfANameAndBuildVisitsTopLevelItemsOnly) {
   since.Expect(kViewDefinitionRegistrationError, u"two.xml",
                {"Error registering view definition: View definition for \"Test.Registry\" already exists."});
   EXPECT_EQ(GetViewDefinitionForName("Test.Registry"), first);
+  EXPECT_EQ(U8(ViewDefinitionSource(first)), "one.xml");
+  EXPECT_EQ(U8(ViewDefinitionSource(second)), "");
   EXPECT_FALSE(GetViewDefinitionForName("Test.Missing"));
 
   Recorder recorder;

@@ -25,6 +25,7 @@
 #include "Reading.h"
 #include "TextUtil.h"
 #include "Validation.h"
+#include "ViewShow.h"
 
 namespace ovrameta {
 
@@ -207,58 +208,49 @@ bool IsExistingPath(const std::string& argument) {
 // ---------------------------------------------------------------------------
 // Printing
 
-void PrintLines(std::ostream& out, const std::string& indent, const std::string& head,
-                const std::string& text) {
-  // Continuation lines of a multi-line value line up under its first line.
-  out << indent << head;
-  const std::string continuation = indent + std::string(head.size(), ' ');
-  std::string::size_type start = 0;
-  while (true) {
-    const auto end = text.find('\n', start);
-    out << text.substr(start, end - start) << '\n';
-    if (end == std::string::npos) break;
-    out << continuation;
-    start = end + 1;
-  }
+// The path description of a value named "prefix:Description".
+std::string DescriptionOf(const std::string& name) { return name.substr(name.find(':') + 1); }
+
+// Drops the values, and the fields of structures, that a view has shown.
+bool Unshown(const std::string& namespaceURI, const ShownKeys& shown, ValueNode& node) {
+  if (shown.count(ShownKey(namespaceURI, DescriptionOf(node.name)))) return false;
+  if (node.kind != ValueNode::kStruct) return true;
+  auto& fields = node.children;
+  fields.erase(std::remove_if(fields.begin(), fields.end(),
+                              [&](ValueNode& field) { return !Unshown(namespaceURI, shown, field); }),
+               fields.end());
+  return !fields.empty();
 }
 
-void PrintNode(std::ostream& out, const ValueNode& node, int depth) {
-  const std::string indent(static_cast<std::size_t>(depth) * 2, ' ');
-  if (node.mixed) {
-    out << indent << node.label << ": (mixed)\n";
-    return;
+// One packet as show prints it: the named view; or, without a name, the
+// built-in views with their empty items left out, then every other value
+// under the label of its schema, so that nothing the packet holds goes
+// unseen.
+std::string ShowText(const boost::shared_ptr<MetaDataProvider>& provider, const std::string& viewName) {
+  std::string text;
+  ShownKeys shown;
+  {
+    MetaDataReadAccess reader(provider);
+    XMPMetaRef xmp = *reader;
+    if (!viewName.empty()) return ViewText(xmp, GetViewDefinitionForName(viewName));
+    if (xmp)
+      for (const ViewDefinitionPtr& view : ShownViews()) text += CompactViewText(xmp, view, shown);
   }
-  switch (node.kind) {
-    case ValueNode::kSimple:
-      PrintLines(out, indent, node.label + ": ", node.value);
-      break;
-    case ValueNode::kStruct:
-      out << indent << node.label << ":\n";
-      for (const auto& child : node.children) PrintNode(out, child, depth + 1);
-      break;
-    case ValueNode::kArray:
-      if (node.children.empty()) {
-        PrintLines(out, indent, node.label + ": ", node.value);
-        break;
-      }
-      out << indent << node.label << ":\n";
-      for (const auto& item : node.children) {
-        if (item.kind == ValueNode::kSimple) {
-          PrintLines(out, indent + "  ", "- ", item.value);
-        } else {
-          out << indent << "  " << item.label << "\n";
-          for (const auto& child : item.children) PrintNode(out, child, depth + 2);
-        }
-      }
-      break;
-  }
-}
-
-void PrintSchemas(std::ostream& out, const std::vector<SchemaValues>& schemas) {
-  for (const auto& schema : schemas) {
+  std::vector<SchemaValues> rest = ReadAllValues(provider, ReadOptions());
+  std::ostringstream out;
+  for (SchemaValues& schema : rest) {
+    auto& values = schema.values;
+    values.erase(std::remove_if(values.begin(), values.end(),
+                                [&](ValueNode& node) {
+                                  return !Unshown(schema.schema->namespaceURI, shown, node);
+                                }),
+                 values.end());
+    if (values.empty()) continue;
     out << schema.label << '\n';
-    for (const auto& value : schema.values) PrintNode(out, value, 1);
+    for (const auto& value : values) PrintNode(out, value, 1);
   }
+  text += out.str();
+  return text.empty() ? "(no metadata)\n" : text;
 }
 
 // "name = value" lines for every leaf below node (arrays of simple values
@@ -363,9 +355,12 @@ Session::~Session() {
 // ---------------------------------------------------------------------------
 // show
 
-int ShowCommand(const std::vector<std::string>& files, bool each) {
+int ShowCommand(const std::vector<std::string>& files, bool each, const std::string& viewName) {
   Reporter reporter;
-  ReadOptions options;
+  if (!viewName.empty() && !GetViewDefinitionForName(viewName)) {
+    reporter.Error("", "no view is named " + Quoted(viewName) + " (ovrameta views lists them)", kExitUsage);
+    return reporter.status();
+  }
   if (files.size() == 1 || each) {
     struct Shown {
       Reporter notes = Reporter::Buffered();
@@ -381,12 +376,8 @@ int ShowCommand(const std::vector<std::string>& files, bool each) {
           OpenedFile file;
           if (!OpenFile(files[i], out.notes, file)) return;
           out.opened = true;
-          const auto schemas = ReadAllValues(file.provider, options);
+          out.text = ShowText(file.provider, viewName);
           out.notes.FlushLibrary(files[i]);
-          std::ostringstream text;
-          if (schemas.empty()) text << "(no metadata)\n";
-          PrintSchemas(text, schemas);
-          out.text = text.str();
         },
         [&](std::size_t i) {
           Shown& out = shown[i];
@@ -424,10 +415,8 @@ int ShowCommand(const std::vector<std::string>& files, bool each) {
   progress.Clear();
   reporter.SetProgress(nullptr);
   if (opened == 0) return reporter.status();
-  const auto schemas = ReadAllValues(aggregate, options);
+  std::cout << ShowText(aggregate, viewName);
   reporter.FlushLibrary(std::to_string(opened) + " files");
-  if (schemas.empty()) std::cout << "(no metadata)\n";
-  PrintSchemas(std::cout, schemas);
   return reporter.status();
 }
 
@@ -799,6 +788,32 @@ int SchemasCommand(const std::string& prefix) {
       PrintEntry(std::cout, schema->prefix + ":" + property->name, *property,
                  property->isInternal, 1, static_cast<int>(width), open);
     }
+  }
+  return reporter.status();
+}
+
+// ---------------------------------------------------------------------------
+// views
+
+int ViewsCommand(const std::string& name) {
+  Reporter reporter;
+  if (!name.empty()) {
+    const ViewDefinitionPtr view = GetViewDefinitionForName(name);
+    if (!view) {
+      reporter.Error("", "no view is named " + Quoted(name) + " (ovrameta views lists them)", kExitUsage);
+      return reporter.status();
+    }
+    PrintViewLayout(std::cout, *view);
+    return reporter.status();
+  }
+  for (const ViewDefinitionPtr& view : CommonViewDefinitions()) {
+    const std::string source = ToUTF8(ViewDefinitionSource(view));
+    // Built-in views come from resources, which have names, not paths.
+    const bool builtIn = source.find('/') == std::string::npos;
+    ViewItem label;
+    label.label = view->label.empty() ? view->name : view->label;
+    std::cout << view->name << "  " << ToUTF8(label.GetLabel()) << "  "
+              << (builtIn ? "built-in (" + source + ")" : source) << '\n';
   }
   return reporter.status();
 }

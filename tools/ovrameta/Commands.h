@@ -1,5 +1,5 @@
 // Private to the ovrameta tool (not part of the library's interface): the
-// four commands. Each returns the process exit status.
+// commands. Each returns the process exit status.
 #pragma once
 
 #include <string>
@@ -18,12 +18,15 @@ struct GetOptions {
   bool json = false;
 };
 
-int ShowCommand(const std::vector<std::string>& files, bool each);
+// viewName: show that view only; empty: the views, then every other value.
+int ShowCommand(const std::vector<std::string>& files, bool each, const std::string& viewName);
 // arguments: files and names in any order (see SplitArguments).
 int GetCommand(const std::vector<std::string>& arguments, const GetOptions& options);
 // arguments: files and NAME=VALUE assignments in any order.
 int SetCommand(const std::vector<std::string>& arguments, const std::vector<std::string>& deletes);
 int SchemasCommand(const std::string& prefix);
+// name: print that view's layout; empty: list every registered view.
+int ViewsCommand(const std::string& name);
 
 // Brings the library up for the lifetime of the object and relays the
 // problems it reports to standard error.

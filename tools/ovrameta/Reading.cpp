@@ -1,5 +1,6 @@
 #include "Reading.h"
 
+#include <ostream>
 #include <set>
 
 #include <boost/make_shared.hpp>
@@ -283,6 +284,53 @@ std::vector<SchemaValues> ReadAllValues(const boost::shared_ptr<MetaDataProvider
     all.push_back(std::move(values));
   }
   return all;
+}
+
+void PrintLines(std::ostream& out, const std::string& indent, const std::string& head,
+                const std::string& text) {
+  // Continuation lines of a multi-line value line up under its first line.
+  out << indent << head;
+  const std::string continuation = indent + std::string(head.size(), ' ');
+  std::string::size_type start = 0;
+  while (true) {
+    const auto end = text.find('\n', start);
+    out << text.substr(start, end - start) << '\n';
+    if (end == std::string::npos) break;
+    out << continuation;
+    start = end + 1;
+  }
+}
+
+void PrintNode(std::ostream& out, const ValueNode& node, int depth) {
+  const std::string indent(static_cast<std::size_t>(depth) * 2, ' ');
+  if (node.mixed) {
+    out << indent << node.label << ": (mixed)\n";
+    return;
+  }
+  switch (node.kind) {
+    case ValueNode::kSimple:
+      PrintLines(out, indent, node.label + ": ", node.value);
+      break;
+    case ValueNode::kStruct:
+      out << indent << node.label << ":\n";
+      for (const auto& child : node.children) PrintNode(out, child, depth + 1);
+      break;
+    case ValueNode::kArray:
+      if (node.children.empty()) {
+        PrintLines(out, indent, node.label + ": ", node.value);
+        break;
+      }
+      out << indent << node.label << ":\n";
+      for (const auto& item : node.children) {
+        if (item.kind == ValueNode::kSimple) {
+          PrintLines(out, indent + "  ", "- ", item.value);
+        } else {
+          out << indent << "  " << item.label << "\n";
+          for (const auto& child : item.children) PrintNode(out, child, depth + 2);
+        }
+      }
+      break;
+  }
 }
 
 }  // namespace ovrameta

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <functional>
+#include <iosfwd>
 #include <set>
 #include <string>
 #include <vector>
@@ -58,5 +59,13 @@ struct SchemaValues {
 // packet, in order.
 std::vector<SchemaValues> ReadAllValues(
     const boost::shared_ptr<ovrametadata::MetaDataProvider>& provider, const ReadOptions& options);
+
+// Prints head and text at indent; the continuation lines of a multi-line
+// text line up under its first line.
+void PrintLines(std::ostream& out, const std::string& indent, const std::string& head,
+                const std::string& text);
+// A value as "Label: value", structures and arrays below it, indented by
+// two spaces per depth; "(mixed)" where an aggregate's files differ.
+void PrintNode(std::ostream& out, const ValueNode& node, int depth);
 
 }  // namespace ovrameta

@@ -10,6 +10,7 @@
 
 #include "Commands.h"
 #include "Parallel.h"
+#include "ViewShow.h"
 
 namespace {
 
@@ -46,6 +47,8 @@ int main(int argc, char** argv) {
       "show", "Show every value: of one file, or of several files as one aggregate");
   show->add_option("FILE", showFiles, "Media files")->required();
   show->add_flag("--each", each, "Show several files one by one instead of as an aggregate");
+  std::string viewName;
+  show->add_option("--view", viewName, "Show the values as this view lays them out (see views)");
 
   std::vector<std::string> getArguments;
   ovrameta::GetOptions getOptions;
@@ -65,6 +68,10 @@ int main(int argc, char** argv) {
   auto* schemas = app.add_subcommand("schemas", "List the registered schemas and their properties");
   schemas->add_option("PREFIX", schemaPrefix, "Only the schema with this prefix");
 
+  std::string viewsName;
+  auto* views = app.add_subcommand("views", "List the registered views, or show the layout of one");
+  views->add_option("NAME", viewsName, "The view whose layout to show");
+
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
@@ -75,7 +82,9 @@ int main(int argc, char** argv) {
   if (jobs != 0) ovrameta::SetJobs(jobs);
   ovrameta::Session session;
   if (!session.ok()) return ovrameta::kExitUsage;
-  if (*show) return ovrameta::ShowCommand(showFiles, each);
+  if (*show || *views) ovrameta::LoadViews();
+  if (*show) return ovrameta::ShowCommand(showFiles, each, viewName);
+  if (*views) return ovrameta::ViewsCommand(viewsName);
   if (*get) return ovrameta::GetCommand(getArguments, getOptions);
   if (*set) return ovrameta::SetCommand(setArguments, deletes);
   if (*schemas) return ovrameta::SchemasCommand(schemaPrefix);
