@@ -3,6 +3,8 @@
 
 #include <ovracore/FileSupport.h>
 
+#include <ovrametadata/Extensions.h>
+
 #include "InitializeInternal.h"
 
 namespace ovrametadata {
@@ -45,6 +47,14 @@ UTF16String CustomDefinitionsGlobalDirectory() {
 
 UTF16String CustomDefinitionsUserDirectory() {
   return BelowRoot(&ovracore::filesupport::ApplicationSupportFolder_User, kCustomSchemaPath);
+}
+
+UTF16String CustomExtensionsGlobalDirectory() {
+  return BelowRoot(&ovracore::filesupport::ApplicationSupportFolder_Local, kCustomExtensionPath);
+}
+
+UTF16String CustomExtensionsUserDirectory() {
+  return BelowRoot(&ovracore::filesupport::ApplicationSupportFolder_User, kCustomExtensionPath);
 }
 
 UTF16String PanelsDefinitionsUserDirectory(VelkVersion version) {

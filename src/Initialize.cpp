@@ -8,6 +8,7 @@
 
 #include "DefinitionsRegistryInternal.h"
 #include "InitializeInternal.h"
+#include "extensions/ExtensionsInternal.h"
 #include "format/FormatInternal.h"
 #include "views/ViewsInternal.h"
 
@@ -118,8 +119,7 @@ void Terminate() {
   }
   ClearXMPWritingCallbacks();
   ClearErrorCallbacks();
-  // Place of the extension packages' shutdown: the common extension
-  // packages are cleared here, before the error list.
+  ClearExtensionPackages();
   ClearErrorList();
   ClearFormatterTables();
   // Views point into the definitions, so they go first.

@@ -11,3 +11,4 @@
 #include <ovrametadata/Providers.h>
 #include <ovrametadata/MetadataUtils.h>
 #include <ovrametadata/Views.h>
+#include <ovrametadata/Extensions.h>

@@ -14,6 +14,7 @@
 #include <ovrametadata/Paths.h>
 
 #include "InitializeInternal.h"
+#include "extensions/ExtensionsInternal.h"
 #include "views/ViewsInternal.h"
 
 namespace ovrametadata {
@@ -370,6 +371,7 @@ void LoadAllViewDefinitions() {
     for (const ViewDefinitionPtr& view : ParseViewDefinitionsFromBuffer(UTF8String(*contents), source))
       AddViewDefinition(view, source);
   }
+  LoadExtensionPackages();
 }
 
 void ResetViewLoadCount() { sLoadCount = 0; }

@@ -77,6 +77,37 @@ TEST_F(OvrametaTest, ShowViewLaysOutOneViewAndViewsListsThem) {
                               "  section  \"Copyright\"\n    property xmpRights:Marked"});
 }
 
+TEST_F(OvrametaTest, TheSamplePackageAddsItsSchemaViewAndDictionaries) {
+  const fs::path packages = mDir / "user/Orlex/XMP/Metadata Extensions";
+  fs::create_directories(packages);
+  fs::copy(fs::path(OVRA_SAMPLES_DIR) / "packages/PhotoArchive", packages / "PhotoArchive",
+           fs::copy_options::recursive);
+  fs::create_directories(packages / "Broken");
+  const std::string user = "OVRAMETADATA_USER_ROOT=" + Quote((mDir / "user").string());
+  Sample("harbour.jpg");
+
+  const Result listed = Run({"packages"}, user);
+  ASSERT_EQ(listed.status, 0) << listed.err;
+  ExpectContains(listed.out, {"PhotoArchive  1  " + (packages / "PhotoArchive").string() + "\n",
+                              "Problems:\n  " + (packages / "Broken/manifest.xml").string() +
+                                  ": Error parsing manifest file: manifest file is missing from extension package.\n"});
+
+  ASSERT_EQ(Run({"set", "harbour.jpg", "photoArchive:AccessionNumber=1987.041.12",
+                 "photoArchive:Location/photoArchive:Box=B-17", "photoArchive:Condition=good"},
+                user)
+                .status,
+            0);
+  const Result shown = Run({"show", "--view", "PhotoArchive", "harbour.jpg"}, user);
+  ASSERT_EQ(shown.status, 0) << shown.err;
+  ExpectContains(shown.out, {"Photo Archive\n  Identification\n    Accession Number: 1987.041.12\n",
+                             "    Original Title: Harbour at dawn\n", "    Box: B-17\n    Folder:\n",
+                             "    Condition: Good\n", "  --\n"});
+  const Result german = Run({"show", "--view", "PhotoArchive", "harbour.jpg"}, user + " LC_ALL=de_DE.UTF-8");
+  ExpectContains(german.out, {"Fotoarchiv\n", "    Zustand: Gut\n"});
+  // Without the package its properties are unknown names.
+  EXPECT_EQ(Run({"get", "harbour.jpg", "photoArchive:Condition"}).status, 2);
+}
+
 TEST_F(OvrametaTest, ShowOfSeveralFilesMarksDifferingValuesAsMixed) {
   Sample("harbour.jpg", "a.jpg");
   Sample("harbour.jpg", "b.jpg");

@@ -818,4 +818,27 @@ int ViewsCommand(const std::string& name) {
   return reporter.status();
 }
 
+// ---------------------------------------------------------------------------
+// packages
+
+int PackagesCommand(const std::vector<ErrorInfo>& problems) {
+  const std::vector<ExtensionPackage> packages = RegisteredExtensionPackages();
+  std::cout << "Package folders:\n  " << ToUTF8(CustomExtensionsGlobalDirectory()) << "\n  "
+            << ToUTF8(CustomExtensionsUserDirectory()) << '\n';
+  if (packages.empty()) std::cout << "No package is registered.\n";
+  for (const ExtensionPackage& package : packages) {
+    std::ostringstream version;
+    version << package.version;
+    std::cout << ToUTF8(package.name) << "  " << version.str() << "  " << ToUTF8(package.path) << '\n';
+  }
+  std::vector<std::string> lines;
+  for (const ErrorInfo& info : problems) {
+    if (info.type != kExtensionManifestParsingError && info.type != kExtensionPackageRegistrationError) continue;
+    lines.push_back(ToUTF8(info.source) + ": " + ToUTF8(info.message));
+  }
+  if (!lines.empty()) std::cout << "Problems:\n";
+  for (const std::string& line : lines) std::cout << "  " << line << '\n';
+  return kExitSuccess;
+}
+
 }  // namespace ovrameta

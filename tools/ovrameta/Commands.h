@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+#include <ovrametadata/Initialize.h>
+
 namespace ovrameta {
 
 enum ExitStatus {
@@ -27,6 +29,8 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
 int SchemasCommand(const std::string& prefix);
 // name: print that view's layout; empty: list every registered view.
 int ViewsCommand(const std::string& name);
+// The registered extension packages and the problems found registering them.
+int PackagesCommand(const std::vector<ovrametadata::ErrorInfo>& problems);
 
 // Brings the library up for the lifetime of the object and relays the
 // problems it reports to standard error.

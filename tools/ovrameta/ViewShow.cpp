@@ -153,15 +153,17 @@ void PrintItemLayout(std::ostream& out, const ViewItem& item, int depth) {
 
 }  // namespace
 
-void LoadViews() {
+std::vector<ErrorInfo> LoadViews(bool quiet) {
   const std::size_t before = GetErrorInfos().size();
   LoadAllViewDefinitions();
-  const std::vector<ErrorInfo> infos = GetErrorInfos();
-  for (std::size_t i = before; i < infos.size(); ++i) {
-    const std::string source = ToUTF8(infos[i].source);
-    std::cerr << "ovrameta: " << (source.empty() ? "" : source + ": ") << "warning: " << ToUTF8(infos[i].message)
+  std::vector<ErrorInfo> infos = GetErrorInfos();
+  infos.erase(infos.begin(), infos.begin() + static_cast<std::ptrdiff_t>(std::min(before, infos.size())));
+  for (const ErrorInfo& info : quiet ? std::vector<ErrorInfo>() : infos) {
+    const std::string source = ToUTF8(info.source);
+    std::cerr << "ovrameta: " << (source.empty() ? "" : source + ": ") << "warning: " << ToUTF8(info.message)
               << std::endl;
   }
+  return infos;
 }
 
 std::vector<ViewDefinitionPtr> ShownViews() {

@@ -15,8 +15,9 @@
 
 namespace ovrameta {
 
-// Loads the registered views once; their problems are printed as warnings.
-void LoadViews();
+// Loads the registered views and extension packages once. Their problems
+// are printed as warnings unless quiet; either way they are returned.
+std::vector<ovrametadata::ErrorInfo> LoadViews(bool quiet = false);
 
 // The views `show` uses when none is named: the built-in ones in the order a
 // panel reads best, then every other registered view.

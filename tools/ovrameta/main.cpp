@@ -72,6 +72,8 @@ int main(int argc, char** argv) {
   auto* views = app.add_subcommand("views", "List the registered views, or show the layout of one");
   views->add_option("NAME", viewsName, "The view whose layout to show");
 
+  auto* packages = app.add_subcommand("packages", "List the extension packages and the problems found in them");
+
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
@@ -82,7 +84,9 @@ int main(int argc, char** argv) {
   if (jobs != 0) ovrameta::SetJobs(jobs);
   ovrameta::Session session;
   if (!session.ok()) return ovrameta::kExitUsage;
-  if (*show || *views) ovrameta::LoadViews();
+  // Packages may bring schemas, so every command loads them.
+  const auto problems = ovrameta::LoadViews(static_cast<bool>(*packages));
+  if (*packages) return ovrameta::PackagesCommand(problems);
   if (*show) return ovrameta::ShowCommand(showFiles, each, viewName);
   if (*views) return ovrameta::ViewsCommand(viewsName);
   if (*get) return ovrameta::GetCommand(getArguments, getOptions);
