@@ -162,6 +162,7 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
     node.value = text;
     if (options.items) readItems();
   } else {
+    node.read = text;
     node.value = DisplayText(*entry, text);
     // The library formats internal properties itself; dates and GPS
     // coordinates of editorial properties are formatted here. Their rationals

@@ -25,6 +25,7 @@ struct ValueNode {
   std::string primitive;  // primitive type id; empty for a structure
   bool mixed = false;     // values differ between the files of an aggregate
   std::string value;      // display text (arrays: their items joined by "; ")
+  std::string read;       // the value as the library gave it, before choice labels
   boost::optional<std::string> raw;  // stored text, when asked for and stored
   std::vector<ValueNode> children;   // fields of a structure, items of an array
 };

@@ -104,10 +104,9 @@ class ViewPrinter : public ViewBuilderInterface {
     const std::string name = NameOfPath(item.path);
     std::string label = ToUTF8(item.GetLabel());
     if (label.empty()) label = name;
-    ReadOptions options;
-    options.raw = !item.choices.empty();
+    // Never raw: that flips a process-wide switch while other threads read.
     ValueNode node;
-    if (!ReadValue(mXmp, item.path, name, options, node)) {
+    if (!ReadValue(mXmp, item.path, name, ReadOptions(), node)) {
       if (!item.items.empty()) return RenderGroup(item, label + ":", depth);
       if (mPrune) return {};
       return {Block::kValue, Indent(depth) + label + ":\n", false};
@@ -117,9 +116,9 @@ class ViewPrinter : public ViewBuilderInterface {
     if (node.kind == ValueNode::kStruct && !node.mixed && !item.items.empty())
       return RenderGroup(item, label + ":", depth);
     node.label = label;
-    if (node.kind == ValueNode::kSimple && node.raw) {
+    if (node.kind == ValueNode::kSimple) {
       for (const auto& choice : item.choices)
-        if (choice && choice->rawValue == *node.raw) node.value = LabelOr(choice->label, *node.raw);
+        if (choice && choice->rawValue == node.read) node.value = LabelOr(choice->label, node.read);
     }
     std::ostringstream out;
     PrintNode(out, node, depth);
