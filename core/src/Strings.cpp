@@ -283,6 +283,11 @@ UTF8String EncodeXMLReserved(std::string_view text) {
       case '>': out += "&gt;"; break;
       case '"': out += "&quot;"; break;
       case '\'': out += "&apos;"; break;
+      // As references, so that line breaks and tabs in attribute values
+      // survive the parser's normalisation.
+      case '\t': out += "&#9;"; break;
+      case '\n': out += "&#10;"; break;
+      case '\r': out += "&#13;"; break;
       default: out.push_back(c);
     }
   }

@@ -337,4 +337,19 @@ OVRAMETADATA_EXPORT DefinitionsPair ParseBufferAndRegisterDefinitions(UTF8String
 OVRAMETADATA_EXPORT DefinitionsPair ParseDocumentAndRegisterDefinitions(UTF16String const& path,
                                                                         bool mergeIntoExisting);
 
+// ---------------------------------------------------------------------------
+// Writing definitions files. Labels and descriptions are written as the file
+// they came from had them (localisation keys stay keys); the dynamic mark and
+// the presentation hints are not written. Nothing is reported.
+
+// The text of a definitions file holding schemas, then types; nulls skipped.
+OVRAMETADATA_EXPORT UTF8String WriteDefinitionsToBuffer(Range<SchemaDefinitionPtr> schemas,
+                                                        Range<TypeDefinitionPtr> types);
+// Writes the pair to path (a new file renamed over the old one), making the
+// folder when missing; false only when the folder cannot be made.
+OVRAMETADATA_EXPORT bool WriteSchemaFile(DefinitionsPair const& definitions, UTF16String const& path);
+// Writes the file schema was loaded from again, with every schema and type
+// recorded for that file, so that editing one keeps its neighbours.
+OVRAMETADATA_EXPORT void RewriteSchemaFile(SchemaDefinitionPtr schema);
+
 }  // namespace ovrametadata

@@ -12,6 +12,7 @@
 #include <ovrametadata/Common.h>
 #include <ovrametadata/Definitions.h>
 #include <ovrametadata/Export.h>
+#include <ovrametadata/Extensions.h>
 #include <ovrametadata/Paths.h>
 
 namespace ovrametadata {
@@ -104,5 +105,30 @@ OVRAMETADATA_EXPORT std::vector<ViewDefinitionPtr> ParseViewDefinitionsFromDocum
 OVRAMETADATA_EXPORT void LoadAllViewDefinitions();
 // True when a resource name is not that of a view file ("NAME_view.EXT").
 OVRAMETADATA_EXPORT bool IsNotViewDefinition(const UTF16String& resourceName);
+
+// ---- Writing view files ----
+
+// What the file writer hands to the writer of each property.
+struct ViewDefinitionWriterInfo {
+  UTF16String viewName;
+  UTF16String viewLabel;
+  UTF16String viewDescription;
+  UTF16String localizationFile;
+  UTF8String currentPrefix;               // of the schema being written
+  UTF16String currentSectionLabel;        // its label as written
+  UTF16String currentSectionDescription;  // its description as written
+  std::vector<SchemaDefinitionPtr> baseSchemas;
+};
+
+// Writes one view (named, labelled and described by the manifest) that shows
+// every property of schemas, a section per labelled schema. A property is
+// written by its name alone unless it differs from the registered
+// definition (or, for an unregistered namespace, from the base schemas).
+// False only when the folder cannot be made; an empty list writes the
+// declaration alone.
+OVRAMETADATA_EXPORT bool WriteViewDefinitionsFileFromSchema(const std::vector<SchemaDefinitionPtr>& schemas,
+                                                            const std::vector<SchemaDefinitionPtr>& baseSchemas,
+                                                            const GenericPanelManifestParser::ManifestInfo& manifest,
+                                                            const UTF16String& path);
 
 }  // namespace ovrametadata

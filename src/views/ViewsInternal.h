@@ -11,6 +11,8 @@
 
 namespace ovrametadata {
 
+class XMLTextWriter;
+
 // The namespace of view definitions files.
 extern const char* const kViewsUINamespace;
 
@@ -78,5 +80,16 @@ class ViewDefinitionsHandler : public ovracore::AbstractParseHandler {
   bool nameRequired = false;
   UTF16String source;
 };
+
+// The view writer's steps. The first property of the base schemas that has
+// the name of property and differs from it (internal mark, texts), or null.
+PropertyDefinitionPtr CompareProperties(const PropertyDefinition& property,
+                                        const std::vector<SchemaDefinitionPtr>& baseSchemas);
+// One "property" element (or a separator) at level.
+void AddPropertyItem(const PropertyDefinitionPtr& property, const UTF8String& namespaceURI, XMLTextWriter& out,
+                     const ViewDefinitionWriterInfo& info, int level);
+// Every property of schema, one level below level.
+void AddPropertyItems(const SchemaDefinition& schema, XMLTextWriter& out, const ViewDefinitionWriterInfo& info,
+                      int level);
 
 }  // namespace ovrametadata

@@ -124,9 +124,9 @@ TEST(Tokenizing, KeepsOrDropsEmptyTokens) {
 }
 
 TEST(XMLReserved, EncodeDecodeRoundTrip) {
-  const std::string text = "a<b>&\"c\" 'd' \xC3\xA9";
+  const std::string text = "a<b>&\"c\" 'd' \xC3\xA9\tx\n";
   const std::string encoded = EncodeXMLReserved(text);
-  EXPECT_EQ(encoded, "a&lt;b&gt;&amp;&quot;c&quot; &apos;d&apos; \xC3\xA9");
+  EXPECT_EQ(encoded, "a&lt;b&gt;&amp;&quot;c&quot; &apos;d&apos; \xC3\xA9&#9;x&#10;");
   EXPECT_EQ(DecodeXMLReserved(encoded), text);
   // Encoding the encoded text once more must not collapse on decoding.
   EXPECT_EQ(DecodeXMLReserved(EncodeXMLReserved(encoded)), encoded);

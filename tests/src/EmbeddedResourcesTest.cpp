@@ -14,74 +14,11 @@
 using namespace ovrametadata;
 using ovratest::U16;
 using ovratest::U8;
+using ovratest::Describe;
 
 namespace {
 
 namespace fs = std::filesystem;
-
-template <class T>
-std::string Optional(const boost::optional<T>& value) {
-  std::ostringstream out;
-  if (value) {
-    out << *value;
-  } else {
-    out << "-";
-  }
-  return out.str();
-}
-
-void DescribeTexts(std::ostream& out, const LocalizedDefinition& d) {
-  out << " label=" << U8(d.label) << " [" << U8(d.labelSource) << "] description="
-      << U8(d.description) << " [" << U8(d.descriptionSource) << "]";
-}
-
-void DescribeEntry(std::ostream& out, const EntryDefinition& entry, const std::string& indent) {
-  out << indent << entry.name << " type=" << Optional(entry.type)
-      << " extends=" << Optional(entry.extends) << " element=" << Optional(entry.constraints.elementType)
-      << " pattern=" << Optional(entry.constraints.pattern) << " min=" << Optional(entry.constraints.min)
-      << " max=" << Optional(entry.constraints.max)
-      << " deprecated=" << Optional(entry.constraints.deprecated);
-  DescribeTexts(out, entry);
-  out << "\n";
-  for (const auto& choice : entry.constraints.choices) {
-    out << indent << "  choice " << choice->rawValue << " " << U8(choice->label) << " ["
-        << U8(choice->labelSource) << "]\n";
-  }
-  for (const auto& qualifier : entry.constraints.qualifiers) {
-    out << indent << "  qualifier " << qualifier->namespaceURI << " " << qualifier->prefix << "\n";
-    DescribeEntry(out, *qualifier, indent + "    ");
-  }
-}
-
-// Everything a definitions document yields, as text (so that a difference
-// shows where it is).
-std::string Describe(const DefinitionsPair& pair) {
-  std::ostringstream out;
-  for (const auto& schema : pair.first) {
-    out << "schema " << schema->namespaceURI << " " << schema->prefix
-        << " dynamic=" << schema->isDynamic;
-    DescribeTexts(out, *schema);
-    out << "\n";
-    for (const auto& property : schema->properties) {
-      out << "  property internal=" << property->isInternal;
-      if (property->uiHints) {
-        out << " separator=" << property->uiHints->separatorAfter
-            << " multiLine=" << property->uiHints->multiLine;
-      }
-      out << "\n";
-      DescribeEntry(out, *property, "    ");
-    }
-  }
-  for (const auto& type : pair.second) {
-    out << "type\n";
-    DescribeEntry(out, *type, "  ");
-    for (const auto& field : type->fields) {
-      out << "  field " << field->namespaceURI << " " << field->prefix << "\n";
-      DescribeEntry(out, *field, "    ");
-    }
-  }
-  return out.str();
-}
 
 void DescribeItem(std::ostream& out, const ViewItem& item, const std::string& indent) {
   out << indent << item.widget << " " << item.path.namespaceURI << " " << item.path.description << " "

@@ -1,6 +1,7 @@
 // Helpers for the test programs that link the metadata library.
 #pragma once
 
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -78,6 +79,71 @@ std::vector<std::string> Descriptions(const Paths& paths) {
   std::vector<std::string> result;
   for (const ovrametadata::Path& path : paths) result.push_back(path.description);
   return result;
+}
+
+template <class T>
+inline std::string Optional(const boost::optional<T>& value) {
+  std::ostringstream out;
+  if (value) {
+    out << *value;
+  } else {
+    out << "-";
+  }
+  return out.str();
+}
+
+inline void DescribeTexts(std::ostream& out, const ovrametadata::LocalizedDefinition& d) {
+  out << " label=" << U8(d.label) << " [" << U8(d.labelSource) << "] description="
+      << U8(d.description) << " [" << U8(d.descriptionSource) << "]";
+}
+
+inline void DescribeEntry(std::ostream& out, const ovrametadata::EntryDefinition& entry, const std::string& indent) {
+  out << indent << entry.name << " type=" << Optional(entry.type)
+      << " extends=" << Optional(entry.extends) << " element=" << Optional(entry.constraints.elementType)
+      << " pattern=" << Optional(entry.constraints.pattern) << " min=" << Optional(entry.constraints.min)
+      << " max=" << Optional(entry.constraints.max)
+      << " deprecated=" << Optional(entry.constraints.deprecated);
+  DescribeTexts(out, entry);
+  out << "\n";
+  for (const auto& choice : entry.constraints.choices) {
+    out << indent << "  choice " << choice->rawValue << " " << U8(choice->label) << " ["
+        << U8(choice->labelSource) << "]\n";
+  }
+  for (const auto& qualifier : entry.constraints.qualifiers) {
+    out << indent << "  qualifier " << qualifier->namespaceURI << " " << qualifier->prefix << "\n";
+    DescribeEntry(out, *qualifier, indent + "    ");
+  }
+}
+
+// Everything a definitions document yields, as text (so that a difference
+// shows where it is); withHints adds the dynamic mark and the presentation
+// hints.
+inline std::string Describe(const ovrametadata::DefinitionsPair& pair, bool withHints = true) {
+  std::ostringstream out;
+  for (const auto& schema : pair.first) {
+    out << "schema " << schema->namespaceURI << " " << schema->prefix;
+    if (withHints) out << " dynamic=" << schema->isDynamic;
+    DescribeTexts(out, *schema);
+    out << "\n";
+    for (const auto& property : schema->properties) {
+      out << "  property internal=" << property->isInternal;
+      if (withHints && property->uiHints) {
+        out << " separator=" << property->uiHints->separatorAfter
+            << " multiLine=" << property->uiHints->multiLine;
+      }
+      out << "\n";
+      DescribeEntry(out, *property, "    ");
+    }
+  }
+  for (const auto& type : pair.second) {
+    out << "type\n";
+    DescribeEntry(out, *type, "  ");
+    for (const auto& field : type->fields) {
+      out << "  field " << field->namespaceURI << " " << field->prefix << "\n";
+      DescribeEntry(out, *field, "    ");
+    }
+  }
+  return out.str();
 }
 
 }  // namespace ovratest

@@ -108,6 +108,39 @@ TEST_F(OvrametaTest, TheSamplePackageAddsItsSchemaViewAndDictionaries) {
   EXPECT_EQ(Run({"get", "harbour.jpg", "photoArchive:Condition"}).status, 2);
 }
 
+TEST_F(OvrametaTest, WrittenSchemasAndGeneratedViewsLoadAsCustomFilesAndPackages) {
+  const std::string user = "OVRAMETADATA_USER_ROOT=" + Quote((mDir / "user").string());
+  // A copy of a built-in schema under a namespace of one's own.
+  Result xml = Run({"schemas", "--xml", "xmpRights"});
+  ASSERT_EQ(xml.status, 0) << xml.err;
+  for (const auto& [from, to] : {std::pair<std::string, std::string>{"http://ns.adobe.com/xap/1.0/rights/",
+                                                                     "http://example.com/myrights/"},
+                                 {"prefix=\"xmpRights\"", "prefix=\"myRights\""}})
+    xml.out.replace(xml.out.find(from), from.size(), to);
+  const fs::path custom = mDir / "user/Orlex/XMP/Custom Propsheet Panels/4.0/custom";
+  fs::create_directories(custom);
+  WriteFile(custom / "myrights.xml", xml.out);
+  const Result listed = Run({"schemas", "myRights"}, user);
+  ASSERT_EQ(listed.status, 0) << listed.err;
+  ExpectContains(listed.out, {"myRights:UsageTerms", "Copyright Status"});
+
+  // A generated view dropped into a package.
+  const Result view = Run({"views", "--generate", "Mine", "myRights", "dc"}, user);
+  ASSERT_EQ(view.status, 0) << view.err;
+  const fs::path package = mDir / "user/Orlex/XMP/Metadata Extensions/Mine";
+  fs::create_directories(package / "view");
+  WriteFile(package / "manifest.xml",
+            "<extension xmlns=\"http://ns.ovrametadata.org/metadata/extension/1.0/\" name=\"Mine\" version=\"1\"/>");
+  WriteFile(package / "view/mine.xml", view.out);
+  Sample("harbour.jpg");
+  ASSERT_EQ(Run({"set", "harbour.jpg", "myRights:Marked=True"}, user).status, 0);
+  const Result shown = Run({"show", "--view", "Mine", "harbour.jpg"}, user);
+  ASSERT_EQ(shown.status, 0) << shown.err;
+  EXPECT_EQ(shown.err, "");
+  ExpectContains(shown.out, {"Mine\n  XMP Rights Management\n", "    Copyright Status: True\n",
+                             "  Dublin Core\n", "    Title: Harbour at dawn\n"});
+}
+
 TEST_F(OvrametaTest, ShowOfSeveralFilesMarksDifferingValuesAsMixed) {
   Sample("harbour.jpg", "a.jpg");
   Sample("harbour.jpg", "b.jpg");

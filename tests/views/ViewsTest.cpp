@@ -251,3 +251,76 @@ TEST_F(Views, BuiltInViewsLoadOnceWithoutAReportAndAgainAfterRestart) {
 }
 
 }  // namespace
+
+namespace {
+
+std::string WriteView(const std::vector<SchemaDefinitionPtr>& schemas,
+                      const std::vector<SchemaDefinitionPtr>& base, const std::string& file) {
+  GenericPanelManifestParser::ManifestInfo manifest;
+  manifest.name = u"Written";
+  manifest.label = u"$$$/w/view=Written & read";
+  const std::string path = (ovratest::TestRoot() / file).string();
+  EXPECT_TRUE(WriteViewDefinitionsFileFromSchema(schemas, base, manifest, ovratest::U16(path)));
+  return path;
+}
+
+TEST_F(Views, AWrittenViewShowsEveryPropertyAndOverridesOnlyWhatDiffers) {
+  const SchemaDefinitionPtr dc = NamespaceDefinition(kDC);
+  const SchemaDefinitionPtr dm = NamespaceDefinition("http://ns.adobe.com/xmp/1.0/DynamicMedia/");
+  ASSERT_TRUE(dc && dm);
+  ErrorsSince since;
+  const std::string plain = WriteView({dc, dm}, {}, "plain_view.xml");
+  const auto views = ParseViewDefinitionsFromDocument(ovratest::U16(plain));
+  since.ExpectNone();
+  ASSERT_EQ(views.size(), 1u);
+  EXPECT_EQ(views[0]->name, "Written");
+  EXPECT_EQ(views[0]->label, "$$$/w/view=Written & read");
+  ASSERT_EQ(views[0]->items.size(), 2u);
+  EXPECT_EQ(views[0]->items[0]->widget, "section");
+  EXPECT_EQ(views[0]->items[0]->items.size(), dc->properties.size());
+  // Identical to its definition: the name alone.
+  const std::string text = ovratest::ReadFile(plain);
+  EXPECT_NE(text.find("\t\t\t<property name=\"dc:title\" />\n"), std::string::npos) << text;
+
+  // An edited copy: a changed label, a text offered as a choice, a
+  // multi-line hint, a separator; a second schema of the same prefix.
+  auto edited = boost::make_shared<SchemaDefinition>(*dc);
+  edited->labelSource.clear();
+  edited->properties.clear();
+  auto title = boost::make_shared<PropertyDefinition>(*PropertyNameDefinition(dc, "title"));
+  title->labelSource = u"Heading";
+  title->uiHints = PropertyUIHints{true, true};
+  auto format = boost::make_shared<PropertyDefinition>(*PropertyNameDefinition(dc, "format"));
+  format->type = "openchoice";
+  format->constraints.elementType = "mimetype";
+  format->constraints.choices = {boost::make_shared<ChoiceDefinition>(ChoiceDefinition{"image/jpeg", u"JPEG", u"JPEG"})};
+  edited->properties = {title, format};
+  auto other = boost::make_shared<SchemaDefinition>();
+  other->prefix = "dc";
+  other->namespaceURI = "http://example.com/other/";
+  auto internal = boost::make_shared<PropertyDefinition>();
+  internal->name = "Count";
+  internal->isInternal = true;
+  auto separator = boost::make_shared<PropertyDefinition>();
+  separator->uiHints = PropertyUIHints{true, false};
+  other->properties = {internal, separator};
+  auto base = boost::make_shared<SchemaDefinition>();
+  auto external = boost::make_shared<PropertyDefinition>(*internal);
+  external->isInternal = false;
+  base->properties = {external};
+
+  const std::string written = ovratest::ReadFile(WriteView({edited, other}, {base}, "edited_view.xml"));
+  for (const char* piece :
+       {"<view xmlns:dc=\"http://purl.org/dc/elements/1.1/\" name=\"Written\" label=\"$$$/w/view=Written &amp; read\">\n",
+        "\t\t<property name=\"dc:" /* no section: the schema has no label */,
+        "label=\"Heading\" multiLines=\"3\" />\n\t\t<separator/>\n",
+        "<property name=\"dc:format\" widget=\"dropdown\" openChoice=\"true\">\n\t\t\t<choice label=\"JPEG\" "
+        "value=\"image/jpeg\" />\n\t\t</property>\n",
+        "\t\t<property name=\"dc:Count\" readOnly=\"true\" />\n\t\t<separator/>\n\t</view>\n"})
+    EXPECT_NE(written.find(piece), std::string::npos) << piece << "\n" << written;
+  EXPECT_EQ(written.find("http://example.com/other/"), std::string::npos);
+
+  EXPECT_EQ(ovratest::ReadFile(WriteView({}, {}, "empty_view.xml")), "<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n");
+}
+
+}  // namespace

@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
+#include <fstream>
 #include <iostream>
 #include <memory>
 #include <set>
@@ -759,17 +760,38 @@ void PrintEntry(std::ostream& out, const std::string& name, const EntryDefinitio
 
 }  // namespace
 
-int SchemasCommand(const std::string& prefix) {
+namespace {
+
+// The schemas registered under prefixes, or every known one; false (after
+// a message) when a prefix names none.
+bool SchemasFor(const std::vector<std::string>& prefixes, Reporter& reporter,
+                std::vector<SchemaDefinitionPtr>& schemas) {
+  if (prefixes.empty()) {
+    schemas = KnownSchemas();
+    return true;
+  }
+  for (const std::string& prefix : prefixes) {
+    const auto schema = SchemaForPrefix(prefix);
+    if (!schema) {
+      reporter.Error("", "no schema is registered with the prefix " + Quoted(prefix) +
+                             " (ovrameta schemas lists them)",
+                     kExitUsage);
+      return false;
+    }
+    schemas.push_back(schema);
+  }
+  return true;
+}
+
+}  // namespace
+
+int SchemasCommand(const std::vector<std::string>& prefixes, bool xml) {
   Reporter reporter;
   std::vector<SchemaDefinitionPtr> schemas;
-  if (prefix.empty()) {
-    schemas = KnownSchemas();
-  } else if (const auto schema = SchemaForPrefix(prefix)) {
-    schemas.push_back(schema);
-  } else {
-    reporter.Error("", "no schema is registered with the prefix " + Quoted(prefix) +
-                           " (ovrameta schemas lists them)",
-                   kExitUsage);
+  if (!SchemasFor(prefixes, reporter, schemas)) return reporter.status();
+  if (xml) {
+    // The schemas alone: the types they use are registered already.
+    std::cout << WriteDefinitionsToBuffer(Range<SchemaDefinitionPtr>(schemas), Range<TypeDefinitionPtr>());
     return reporter.status();
   }
   bool first = true;
@@ -839,6 +861,29 @@ int PackagesCommand(const std::vector<ErrorInfo>& problems) {
   if (!lines.empty()) std::cout << "Problems:\n";
   for (const std::string& line : lines) std::cout << "  " << line << '\n';
   return kExitSuccess;
+}
+
+// ---------------------------------------------------------------------------
+// views --generate
+
+int GenerateViewCommand(const std::vector<std::string>& arguments) {
+  namespace fs = std::filesystem;
+  Reporter reporter;
+  std::vector<SchemaDefinitionPtr> schemas;
+  const std::vector<std::string> prefixes(arguments.begin() + 1, arguments.end());
+  if (!SchemasFor(prefixes, reporter, schemas)) return reporter.status();
+  GenericPanelManifestParser::ManifestInfo manifest;
+  manifest.name = ToUTF16(arguments.front());
+  // The library writes files; the tool hands the text on.
+  const fs::path folder = fs::temp_directory_path() / ("ovrameta-view-" + std::to_string(::getpid()));
+  const fs::path file = folder / "view.xml";
+  const bool written = WriteViewDefinitionsFileFromSchema(schemas, {}, manifest, ToUTF16(file.string()));
+  std::ifstream in(file, std::ios::binary);
+  std::cout << in.rdbuf();
+  std::error_code ec;
+  fs::remove_all(folder, ec);
+  if (!written) reporter.Error("", "cannot write the view file in " + folder.string(), kExitUsage);
+  return reporter.status();
 }
 
 }  // namespace ovrameta

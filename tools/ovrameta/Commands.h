@@ -26,7 +26,10 @@ int ShowCommand(const std::vector<std::string>& files, bool each, const std::str
 int GetCommand(const std::vector<std::string>& arguments, const GetOptions& options);
 // arguments: files and NAME=VALUE assignments in any order.
 int SetCommand(const std::vector<std::string>& arguments, const std::vector<std::string>& deletes);
-int SchemasCommand(const std::string& prefix);
+// prefixes: only those schemas (all when empty); xml: as a definitions file.
+int SchemasCommand(const std::vector<std::string>& prefixes, bool xml);
+// arguments: the view's name, then the prefixes of the schemas it shows.
+int GenerateViewCommand(const std::vector<std::string>& arguments);
 // name: print that view's layout; empty: list every registered view.
 int ViewsCommand(const std::string& name);
 // The registered extension packages and the problems found registering them.

@@ -64,13 +64,20 @@ int main(int argc, char** argv) {
   set->add_option("ARGS", setArguments, "FILE... NAME=VALUE...")->required();
   set->add_option("--delete", deletes, "Delete the value of NAME")->expected(1, -1);
 
-  std::string schemaPrefix;
+  std::vector<std::string> schemaPrefixes;
+  bool schemasXml = false;
   auto* schemas = app.add_subcommand("schemas", "List the registered schemas and their properties");
-  schemas->add_option("PREFIX", schemaPrefix, "Only the schema with this prefix");
+  schemas->add_option("PREFIX", schemaPrefixes, "Only the schemas with these prefixes");
+  schemas->add_flag("--xml", schemasXml,
+                    "Write the schemas as a definitions file (a start for a custom schema)");
 
   std::string viewsName;
   auto* views = app.add_subcommand("views", "List the registered views, or show the layout of one");
   views->add_option("NAME", viewsName, "The view whose layout to show");
+  std::vector<std::string> generatePrefixes;
+  views->add_option("--generate", generatePrefixes,
+                    "NAME PREFIX...: write a view file named NAME showing those schemas")
+      ->expected(2, -1);
 
   auto* packages = app.add_subcommand("packages", "List the extension packages and the problems found in them");
 
@@ -88,9 +95,10 @@ int main(int argc, char** argv) {
   const auto problems = ovrameta::LoadViews(static_cast<bool>(*packages));
   if (*packages) return ovrameta::PackagesCommand(problems);
   if (*show) return ovrameta::ShowCommand(showFiles, each, viewName);
+  if (*views && !generatePrefixes.empty()) return ovrameta::GenerateViewCommand(generatePrefixes);
   if (*views) return ovrameta::ViewsCommand(viewsName);
   if (*get) return ovrameta::GetCommand(getArguments, getOptions);
   if (*set) return ovrameta::SetCommand(setArguments, deletes);
-  if (*schemas) return ovrameta::SchemasCommand(schemaPrefix);
+  if (*schemas) return ovrameta::SchemasCommand(schemaPrefixes, schemasXml);
   return ovrameta::kExitUsage;
 }

@@ -47,9 +47,10 @@ UTF16String NumberToUTF16String(double value, unsigned decimals);
 std::vector<UTF8String> Tokenize(std::string_view text, std::string_view separators,
                                  bool keepEmpty = true);
 
-// XML reserved characters: & < > " ' become entity references; decoding
-// also resolves numeric references (&#65; &#x41;). Unknown or malformed
-// references are left as they stand.
+// XML reserved characters: & < > " ' become entity references, tab, line
+// feed and carriage return numeric references (attribute values keep them);
+// decoding also resolves numeric references (&#65; &#x41;). Unknown or
+// malformed references are left as they stand.
 UTF8String EncodeXMLReserved(std::string_view text);
 UTF8String DecodeXMLReserved(std::string_view text);
 
