@@ -77,7 +77,8 @@ TEST(DefinitionsWriter, AwkwardTextsNumbersAndChoicesReadBack) {
       <xmp_property name="c" type="closedchoice" deprecated="false" label="C"><xmp_choice raw_value="1" label="One"/>
       </xmp_property></xmp_schema></xmp_definitions>)",
                                                           u"loose");
-  const auto& c = *RoundTrip(loose).first.at(0)->properties.at(0);
+  const DefinitionsPair looseBack = RoundTrip(loose);
+  const auto& c = *looseBack.first.at(0)->properties.at(0);
   EXPECT_EQ(c.constraints.elementType, boost::make_optional(std::string("text")));
   EXPECT_FALSE(c.constraints.deprecated);
 }
