@@ -31,6 +31,10 @@ const ovracore::ResourceTable* sModule = nullptr;
 const char* const kBaseResources[] = {"primitive_type_definitions",
                                       "constructed_type_definitions", "aux_definitions",
                                       "orlex_definitions"};
+// Schemas real photo files carry beyond the standard set; they use the
+// standard schemas' types, so they load after them.
+const char* const kCommonResources[] = {"lr_definitions", "mwgrs_definitions", "mwgkw_definitions",
+                                        "gpano_definitions"};
 
 // The toolkit's internal assertions are of no interest to the host.
 void IgnoreToolkitAssertion(void*, const char*) {}
@@ -49,6 +53,15 @@ void StartToolkit() {
     ovraxmp::XMPMeta::RegisterAssertNotify(nullptr, nullptr);
     ovraxmp::XMPMeta::Terminate();
     throw;
+  }
+}
+
+void LoadCommonSchemas() {
+  for (const char* name : kCommonResources) {
+    for (const SchemaDefinitionPtr& schema : LoadDefinitionsFromResource(ovracore::ToUTF16(name)).first) {
+      schema->isCustom = false;
+      AddCommonSchemaDefinition(schema);
+    }
   }
 }
 
@@ -102,6 +115,7 @@ void Initialize() {
   // schemas are registered but listed nowhere.
   for (const char* name : kBaseResources) LoadDefinitionsFromResource(ovracore::ToUTF16(name));
   LoadStandardSchemas();
+  LoadCommonSchemas();
   LoadDefinitionsDirectory(CustomDefinitionsGlobalDirectory(), &IsSchemaExcludedFromGlobal);
   LoadDefinitionsDirectory(CustomDefinitionsUserDirectory(), {});
 

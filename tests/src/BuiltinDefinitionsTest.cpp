@@ -1,6 +1,7 @@
 // The built-in definitions resources: they load cleanly and say what the
 // published schemas say about the properties real files carry.
 #include <map>
+#include <iterator>
 #include <set>
 #include <string>
 #include <vector>
@@ -96,8 +97,18 @@ TEST(BuiltinDefinitions, StartUpLoadsEveryResourceWithoutAnyReport) {
 
   std::set<std::string> common;
   for (const auto& schema : CommonSchemaDefinitions()) common.insert(schema->namespaceURI);
-  EXPECT_EQ(common.size(), static_cast<std::size_t>(kStandardSchemaCount));
+  // The standard schemas and those real photo files carry besides.
+  const char* const kCommonNamespaces[] = {"http://ns.adobe.com/lightroom/1.0/",
+                                           "http://www.metadataworkinggroup.com/schemas/regions/",
+                                           "http://www.metadataworkinggroup.com/schemas/keywords/",
+                                           "http://ns.google.com/photos/1.0/panorama/"};
+  EXPECT_EQ(common.size(), static_cast<std::size_t>(kStandardSchemaCount) + std::size(kCommonNamespaces));
   for (const char* namespaceURI : kStandardNamespaces) EXPECT_EQ(common.count(namespaceURI), 1u);
+  for (const char* namespaceURI : kCommonNamespaces) {
+    const SchemaDefinitionPtr schema = NamespaceDefinition(namespaceURI);
+    ASSERT_TRUE(schema) << namespaceURI;
+    EXPECT_FALSE(schema->isCustom);
+  }
   EXPECT_TRUE(DynamicSchemaDefinitions().empty());
 
   std::set<std::string> marks;
