@@ -1,5 +1,6 @@
 // Definitions files written back: the mirror of the parser for everything
 // it writes, with labels and descriptions as written (localisation keys).
+#include <algorithm>
 #include <charconv>
 
 #include <ovracore/FileSupport.h>
@@ -136,7 +137,17 @@ bool WriteSchemaFile(DefinitionsPair const& definitions, UTF16String const& path
 void RewriteSchemaFile(SchemaDefinitionPtr schema) {
   const UTF16String path = filePathForSchema(schema);
   if (path.empty()) return;
-  WriteSchemaFile({allSchemasFromSourceFile(path), allTypesFromSourceFile(path)}, path);
+  // The file's schemas in the order they were loaded, which is its order.
+  std::vector<SchemaDefinitionPtr> loaded;
+  for (const auto& range : {CommonSchemaDefinitions(), DynamicSchemaDefinitions()})
+    for (const SchemaDefinitionPtr& registered : range) loaded.push_back(registered);
+  std::vector<SchemaDefinitionPtr> schemas = allSchemasFromSourceFile(path);
+  const auto position = [&](const SchemaDefinitionPtr& s) {
+    return std::find(loaded.begin(), loaded.end(), s) - loaded.begin();
+  };
+  std::stable_sort(schemas.begin(), schemas.end(),
+                   [&](const SchemaDefinitionPtr& a, const SchemaDefinitionPtr& b) { return position(a) < position(b); });
+  WriteSchemaFile({schemas, allTypesFromSourceFile(path)}, path);
 }
 
 }  // namespace ovrametadata
