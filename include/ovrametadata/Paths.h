@@ -2,6 +2,8 @@
 // built from definitions, and how it leads back to them.
 #pragma once
 
+#include <set>
+
 #include <boost/optional.hpp>
 #include <boost/shared_ptr.hpp>
 
@@ -127,5 +129,29 @@ OVRAMETADATA_EXPORT Range<Path> DescendantLeafPaths(const Path& path);
 // null.
 OVRAMETADATA_EXPORT Range<Path> DescendantLeafPaths(
     const boost::shared_ptr<SchemaDefinition>& schema);
+
+// ---- Path lists: the leaf properties a user chose to show ----
+// The document ("md.paths") holds one "metadata_path" element per path with
+// the five members of Path, in the set's order.
+
+// One path's "metadata_path" element; out is cleared first.
+OVRAMETADATA_EXPORT void PathAsXMLFragment(UTF8String& out, const Path& path);
+// The whole document; out is cleared first.
+OVRAMETADATA_EXPORT void IncludedLeafPathsAsXMLString(const std::set<Path>& paths, UTF8String& out);
+// Adds the stored paths that still have a definition and are leaves (the
+// others are dropped silently, so that lists survive definition changes).
+// False when the document is not well-formed XML; never throws.
+OVRAMETADATA_EXPORT bool ReadIncludedLeafPathsAsXMLString(std::set<Path>& paths, const UTF8String& document);
+OVRAMETADATA_EXPORT bool ReadIncludedLeafPathsAsXMLFile(std::set<Path>& paths, const UTF16String& file);
+
+// ---- Which properties panels show ----
+// The host's own block list (only namespace and description count).
+OVRAMETADATA_EXPORT void BlacklistPropertyForClient(const Path& path, bool blocked);
+OVRAMETADATA_EXPORT bool IsPropertyBlacklistedByClient(const Path& path);
+// The library's: the raw converter's tone curve, which no panel can edit.
+OVRAMETADATA_EXPORT bool IsPropertyBlacklistedInternally(const Path& path);
+// False for blocked properties and for choices and alternatives whose
+// elements cannot be shown as one (a choice of dates, say).
+OVRAMETADATA_EXPORT bool IsPropertyUISupported(const Path& path);
 
 }  // namespace ovrametadata

@@ -12,3 +12,4 @@
 #include <ovrametadata/MetadataUtils.h>
 #include <ovrametadata/Views.h>
 #include <ovrametadata/Extensions.h>
+#include <ovrametadata/MRU.h>

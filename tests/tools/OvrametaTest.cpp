@@ -141,6 +141,34 @@ TEST_F(OvrametaTest, WrittenSchemasAndGeneratedViewsLoadAsCustomFilesAndPackages
                              "  Dublin Core\n", "    Title: Harbour at dawn\n"});
 }
 
+TEST_F(OvrametaTest, SetRemembersRecentValuesAndFieldListsNarrowShow) {
+  Sample("harbour.jpg");
+  const std::string user = "OVRAMETADATA_USER_ROOT=" + Quote((mDir / "user").string());
+  for (const char* title : {"One", "Two", "One"}) ASSERT_EQ(Run({"set", "harbour.jpg", std::string("dc:title=") + title}, user).status, 0);
+  for (int i = 0; i < 25; ++i) ASSERT_EQ(Run({"set", "harbour.jpg", "xmp:Label=L" + std::to_string(i)}, user).status, 0);
+  // Newest first, each value once, at most twenty.
+  EXPECT_EQ(Run({"recent", "dc:title"}, user).out, "dc:title\n  One\n  Two\n");
+  const Result labels = Run({"recent", "xmp:Label"}, user);
+  EXPECT_EQ(std::count(labels.out.begin(), labels.out.end(), '\n'), 21);
+  EXPECT_EQ(labels.out.rfind("xmp:Label\n  L24\n  L23\n", 0), 0u);
+  EXPECT_TRUE(fs::exists(mDir / "user/Orlex/XMP/Propsheet/PropsheetMRU.xml"));
+  EXPECT_EQ(Run({"recent", "--clear"}, user).status, 0);
+  EXPECT_EQ(Run({"recent"}, user).out, "");
+
+  const Result list = Run({"fields", "dc:title", "Iptc4xmpCore:CreatorContactInfo"});
+  ASSERT_EQ(list.status, 0) << list.err;
+  WriteFile(mDir / "list.xml", list.out);
+  const Result shown = Run({"show", "--fields", "list.xml", "harbour.jpg"});
+  ASSERT_EQ(shown.status, 0) << shown.err;
+  EXPECT_EQ(shown.out, "Iptc4xmpCore:CreatorContactInfo/Iptc4xmpCore:CiAdrCity: San Francisco\n"
+                       "Iptc4xmpCore:CreatorContactInfo/Iptc4xmpCore:CiEmailWork: ada@example.org\n"
+                       "dc:title: One\n");
+  EXPECT_EQ(Run({"show", "--fields", "missing.xml", "harbour.jpg"}).status, 2);
+
+  // The raw converter's tone curve is no panel's business.
+  ExpectContains(Run({"schemas", "crs"}).out, {"crs:ToneCurve", "(not shown in panels)"});
+}
+
 TEST_F(OvrametaTest, ShowOfSeveralFilesMarksDifferingValuesAsMixed) {
   Sample("harbour.jpg", "a.jpg");
   Sample("harbour.jpg", "b.jpg");

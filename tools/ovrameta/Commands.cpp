@@ -20,6 +20,7 @@
 
 #include <ovrametadata/ovrametadata.h>
 
+#include "Lists.h"
 #include "Names.h"
 #include "Parallel.h"
 #include "Progress.h"
@@ -227,7 +228,9 @@ bool Unshown(const std::string& namespaceURI, const ShownKeys& shown, ValueNode&
 // built-in views with their empty items left out, then every other value
 // under the label of its schema, so that nothing the packet holds goes
 // unseen.
-std::string ShowText(const boost::shared_ptr<MetaDataProvider>& provider, const std::string& viewName) {
+std::string ShowText(const boost::shared_ptr<MetaDataProvider>& provider, const std::string& viewName,
+                     const std::vector<Path>* fields) {
+  if (fields) return FieldsText(provider, *fields);
   std::string text;
   ShownKeys shown;
   {
@@ -356,8 +359,12 @@ Session::~Session() {
 // ---------------------------------------------------------------------------
 // show
 
-int ShowCommand(const std::vector<std::string>& files, bool each, const std::string& viewName) {
+int ShowCommand(const std::vector<std::string>& files, bool each, const std::string& viewName,
+                const std::string& fieldList) {
   Reporter reporter;
+  std::vector<Path> fieldPaths;
+  if (!fieldList.empty() && !ReadFieldList(fieldList, fieldPaths)) return kExitUsage;
+  const std::vector<Path>* fields = fieldList.empty() ? nullptr : &fieldPaths;
   if (!viewName.empty() && !GetViewDefinitionForName(viewName)) {
     reporter.Error("", "no view is named " + Quoted(viewName) + " (ovrameta views lists them)", kExitUsage);
     return reporter.status();
@@ -377,7 +384,7 @@ int ShowCommand(const std::vector<std::string>& files, bool each, const std::str
           OpenedFile file;
           if (!OpenFile(files[i], out.notes, file)) return;
           out.opened = true;
-          out.text = ShowText(file.provider, viewName);
+          out.text = ShowText(file.provider, viewName, fields);
           out.notes.FlushLibrary(files[i]);
         },
         [&](std::size_t i) {
@@ -416,7 +423,7 @@ int ShowCommand(const std::vector<std::string>& files, bool each, const std::str
   progress.Clear();
   reporter.SetProgress(nullptr);
   if (opened == 0) return reporter.status();
-  std::cout << ShowText(aggregate, viewName);
+  std::cout << ShowText(aggregate, viewName, fields);
   reporter.FlushLibrary(std::to_string(opened) + " files");
   return reporter.status();
 }
@@ -706,6 +713,11 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
       });
   progressWritten.Clear();
   reporter.SetProgress(nullptr);
+  if (failed < files.size()) {
+    std::vector<std::pair<std::string, std::string>> recent;
+    for (const auto& assignment : assignments) recent.emplace_back(assignment.name.name, assignment.value);
+    RecordRecentValues(recent);
+  }
   if (failed > 0 || files.size() > 1) {
     const std::size_t written = files.size() - failed;
     std::cerr << "ovrameta: " << written << (written == 1 ? " file" : " files") << " written, " << failed
@@ -720,7 +732,8 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
 namespace {
 
 void PrintEntry(std::ostream& out, const std::string& name, const EntryDefinition& entry,
-                bool internal, int depth, int nameWidth, std::set<std::string>& open);
+                bool internal, int depth, int nameWidth, std::set<std::string>& open,
+                bool notInPanels = false);
 
 void PrintFields(std::ostream& out, const TypeDefinition& type, int depth,
                  std::set<std::string>& open) {
@@ -739,13 +752,15 @@ void PrintFields(std::ostream& out, const TypeDefinition& type, int depth,
 }
 
 void PrintEntry(std::ostream& out, const std::string& name, const EntryDefinition& entry,
-                bool internal, int depth, int nameWidth, std::set<std::string>& open) {
+                bool internal, int depth, int nameWidth, std::set<std::string>& open,
+                bool notInPanels) {
   const std::string indent(static_cast<std::size_t>(depth) * 2, ' ');
   std::string padded = name;
   if (static_cast<int>(padded.size()) < nameWidth) padded.append(nameWidth - padded.size(), ' ');
   out << indent << padded << "  " << TypeText(entry);
   out << "  " << LabelOr(entry.label, entry.name);
   if (internal) out << "  (internal)";
+  if (notInPanels) out << "  (not shown in panels)";
   out << '\n';
   for (const auto& choice : ChoicesOf(entry)) {
     if (!choice) continue;
@@ -807,8 +822,9 @@ int SchemasCommand(const std::vector<std::string>& prefixes, bool xml) {
     std::set<std::string> open;
     for (const auto& property : schema->properties) {
       if (!property) continue;
+      const bool panels = IsPropertyUISupported(CreatePathFromSchemaProperty(schema, property));
       PrintEntry(std::cout, schema->prefix + ":" + property->name, *property,
-                 property->isInternal, 1, static_cast<int>(width), open);
+                 property->isInternal, 1, static_cast<int>(width), open, !panels);
     }
   }
   return reporter.status();

@@ -20,8 +20,10 @@ struct GetOptions {
   bool json = false;
 };
 
-// viewName: show that view only; empty: the views, then every other value.
-int ShowCommand(const std::vector<std::string>& files, bool each, const std::string& viewName);
+// viewName: show that view only; fieldList: only the fields of that path
+// list; neither: the views, then every other value.
+int ShowCommand(const std::vector<std::string>& files, bool each, const std::string& viewName,
+                const std::string& fieldList);
 // arguments: files and names in any order (see SplitArguments).
 int GetCommand(const std::vector<std::string>& arguments, const GetOptions& options);
 // arguments: files and NAME=VALUE assignments in any order.

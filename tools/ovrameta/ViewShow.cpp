@@ -99,6 +99,8 @@ class ViewPrinter : public ViewBuilderInterface {
   }
 
   Block RenderProperty(const ViewItem& item, int depth) {
+    // What panels cannot show is left out, as a host's panel leaves it out.
+    if (!IsPropertyUISupported(item.path)) return {};
     const std::string key = ShownKey(item.path.namespaceURI, item.path.description);
     if (mSkip && mSkip->count(key)) return {};
     const std::string name = NameOfPath(item.path);

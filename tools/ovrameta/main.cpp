@@ -9,6 +9,7 @@
 #include <ovrametadata/MetadataUtils.h>
 
 #include "Commands.h"
+#include "Lists.h"
 #include "Parallel.h"
 #include "ViewShow.h"
 
@@ -49,6 +50,8 @@ int main(int argc, char** argv) {
   show->add_flag("--each", each, "Show several files one by one instead of as an aggregate");
   std::string viewName;
   show->add_option("--view", viewName, "Show the values as this view lays them out (see views)");
+  std::string fieldList;
+  show->add_option("--fields", fieldList, "Show only the fields of this path list (see fields)");
 
   std::vector<std::string> getArguments;
   ovrameta::GetOptions getOptions;
@@ -81,6 +84,16 @@ int main(int argc, char** argv) {
 
   auto* packages = app.add_subcommand("packages", "List the extension packages and the problems found in them");
 
+  std::string recentName;
+  bool recentClear = false;
+  auto* recent = app.add_subcommand("recent", "The values set recently, per property");
+  recent->add_option("NAME", recentName, "Only this property's values");
+  recent->add_flag("--clear", recentClear, "Forget every recent value");
+
+  std::vector<std::string> fieldNames;
+  auto* fields = app.add_subcommand("fields", "Write a path list of the fields below properties (for show --fields)");
+  fields->add_option("NAME", fieldNames, "Properties")->required();
+
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
@@ -94,7 +107,9 @@ int main(int argc, char** argv) {
   // Packages may bring schemas, so every command loads them.
   const auto problems = ovrameta::LoadViews(static_cast<bool>(*packages));
   if (*packages) return ovrameta::PackagesCommand(problems);
-  if (*show) return ovrameta::ShowCommand(showFiles, each, viewName);
+  if (*show) return ovrameta::ShowCommand(showFiles, each, viewName, fieldList);
+  if (*recent) return ovrameta::RecentCommand(recentName, recentClear);
+  if (*fields) return ovrameta::FieldsCommand(fieldNames);
   if (*views && !generatePrefixes.empty()) return ovrameta::GenerateViewCommand(generatePrefixes);
   if (*views) return ovrameta::ViewsCommand(viewsName);
   if (*get) return ovrameta::GetCommand(getArguments, getOptions);
