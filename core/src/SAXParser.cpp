@@ -236,6 +236,7 @@ class ExpatParser final : public Parser {
   }
 
   UTF8String ErrorMessage() const override { return mError; }
+  bool Refused() const override { return mRefused; }
   std::uint64_t CurrentByteIndex() const override {
     const XML_Index index = XML_GetCurrentByteIndex(mParser.get());
     return index < 0 ? 0 : static_cast<std::uint64_t>(index);
@@ -255,6 +256,7 @@ class ExpatParser final : public Parser {
 
   bool Fail(const std::string& message) {
     if (mError.empty()) mError = message;
+    mRefused = true;
     return false;
   }
 
@@ -292,6 +294,7 @@ class ExpatParser final : public Parser {
       // Nothing left to say when even the message cannot be built.
     }
     mStopped = true;
+    mRefused = true;
     XML_StopParser(mParser.get(), XML_FALSE);
   }
 
@@ -390,6 +393,7 @@ class ExpatParser final : public Parser {
   ParserLimits mLimits;
   ParserHandle mParser;
   UTF8String mError;
+  bool mRefused = false;
   UTF8String mText;
   // Reused from element to element, to keep their storage.
   Attributes mAttributes;

@@ -6,6 +6,7 @@
 #include <limits>
 #include <string>
 
+#include <ovracore/Localizer.h>
 #include <ovracore/Strings.h>
 #include <ovraxmp/XMPToolkit.h>
 #include <ovrametadata/Initialize.h>
@@ -86,6 +87,13 @@ void FileProvider::ReloadFile() {
                              kReadOpenFlags);
       meta.Erase();
       if (file.GetXMP(&meta)) result = meta.GetInternalRef();
+      // Said once per read: the rest of the file's metadata is still shown.
+      if (file.PacketUnreadable()) {
+        SendError(kErrorReadingXMP,
+                  ovracore::ZString("$$$/ovrametadata/FileProvider/UnreadablePacket=the file's XMP packet cannot be "
+                                    "read; only the metadata stored outside it is shown."),
+                  mFilePath);
+      }
       // The handler closes the file when it goes.
     } catch (...) {
       // An unreadable file is a provider without metadata; not reported.

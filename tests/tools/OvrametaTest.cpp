@@ -169,6 +169,23 @@ TEST_F(OvrametaTest, SetRemembersRecentValuesAndFieldListsNarrowShow) {
   ExpectContains(Run({"schemas", "crs"}).out, {"crs:ToneCurve", "(not shown in panels)"});
 }
 
+TEST_F(OvrametaTest, AMalformedPacketHidTheFilesOtherMetadata) {
+  // The packet's closing tag broken, the EXIF block intact.
+  std::string bytes = ReadFile(fs::path(OVRA_SAMPLES_DIR) / "harbour.jpg");
+  const auto at = bytes.find("</rdf:Description>");
+  ASSERT_NE(at, std::string::npos);
+  bytes.replace(at, 18, "</rdf:Descriptiox>");
+  WriteFile(mDir / "bad.jpg", bytes);
+  const Result shown = Run({"show", "bad.jpg"});
+  EXPECT_EQ(shown.status, 0);
+  ExpectContains(shown.out, {"    Make: Orlex\n"});
+  const std::string notice = "the file's XMP packet cannot be read; only the metadata stored outside it is shown.";
+  ExpectContains(shown.err, {"bad.jpg", notice});
+  EXPECT_EQ(shown.err.find(notice), shown.err.rfind(notice));
+  EXPECT_EQ(Run({"set", "bad.jpg", "xmp:Label=Red"}).status, 2);
+  EXPECT_EQ(ReadFile(mDir / "bad.jpg"), bytes);
+}
+
 TEST_F(OvrametaTest, ShowOfSeveralFilesMarksDifferingValuesAsMixed) {
   Sample("harbour.jpg", "a.jpg");
   Sample("harbour.jpg", "b.jpg");

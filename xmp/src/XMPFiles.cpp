@@ -85,6 +85,7 @@ struct XMPFiles::State {
   bool open = false;
   bool sidecar = false;
   std::string refusal;
+  bool unreadable = false;  // the stored packet does not parse
   mutable std::optional<XMP_FileFormat> format;
 
   // The file's layout and stored XMP; for an update, the original and
@@ -164,6 +165,8 @@ bool XMPFiles::OpenFile(const std::string& filePath, XMP_FileFormat format, XMP_
 
 const std::string& XMPFiles::GetRefusal() const { return mState->refusal; }
 
+bool XMPFiles::PacketUnreadable() const { return mState->unreadable; }
+
 bool XMPFiles::GetFileInfo(std::string* filePath, XMP_OptionBits* openFlags, XMP_FileFormat* format) const {
   const State& s = *mState;
   if (!s.open) return false;
@@ -192,18 +195,22 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
   if (!s.refusal.empty()) return false;
 
   XMPMeta shown;
+  // A packet that does not parse hides nothing else: the metadata outside it
+  // is still shown (no write may replace such a packet, see OpenFile). A
+  // packet the checks refuse is kept from the toolkit's handler as well.
+  bool handlerMayRead = true;
+  s.unreadable = false;
   try {
     shown = s.stored->TakeStored();
-  } catch (const XMP_Error&) {
-    // A packet that does not parse is XMP nobody can read, and that no
-    // write may replace.
+  } catch (const XMP_Error& e) {
+    s.unreadable = true;
     s.refusal = "its XMP packet cannot be read";
-    return false;
+    handlerMayRead = e.GetID() != kXMPErr_BadXMP;
   }
-  bool any = s.stored->Exists();
+  bool any = s.stored->Exists() && !s.unreadable;
   // Only where there is native metadata, or where the layer does not know
   // the layout, does the toolkit's handler add anything.
-  if (!s.sidecar && (s.container->HasNativeMetadata() || !s.container->KnowsLayout())) {
+  if (!s.sidecar && handlerMayRead && (s.container->HasNativeMetadata() || !s.container->KnowsLayout())) {
     // The handler's view: the stored packet merged with native metadata.
     const detail::FileHandle file(xmp_files_open_new(s.target.c_str(), XMP_OPEN_READ));
     if (file) {

@@ -277,9 +277,12 @@ void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_Option
     // first (malformed XML too, which it would refuse after complaining on
     // stderr).
     std::string problem;
-    if (!detail::ScanPacket(std::string_view(buffer, length), &problem)) {
+    bool refused = true;
+    if (!detail::ScanPacket(std::string_view(buffer, length), &problem, nullptr, &refused)) {
       xmp_free(fresh);
-      detail::Throw(kXMPErr_BadXML, "parsing XMP: " + problem);
+      // Malformed XML is what the toolkit's own readers cope with; what the
+      // check refuses (nesting, sizes, DOCTYPE) they must never see.
+      detail::Throw(refused ? kXMPErr_BadXMP : kXMPErr_BadXML, "parsing XMP: " + problem);
     }
     ok = xmp_parse(fresh, buffer, length);
   }

@@ -103,6 +103,9 @@ class Parser {
   bool ParseBuffer(std::string_view text) { return ParseBuffer(text.data(), text.size()); }
   virtual bool ParseFile(const UTF16String& path) = 0;
   virtual UTF8String ErrorMessage() const = 0;
+  // After a failure: true when a limit, a refused construct or a handler
+  // ended the parse, false when the XML itself is malformed.
+  virtual bool Refused() const = 0;
   // Where the event being delivered lies in the input: the byte offset of
   // its first byte and its length (a start tag, an end tag; 0 for the end
   // of an empty-element tag). Valid only inside a handler's call.

@@ -71,6 +71,9 @@ class XMPFiles {
   void PutXMP(const XMPMeta& xmpObj);
   // Why the file was refused; empty when it was not.
   const std::string& GetRefusal() const;
+  // After GetXMP: whether the file holds an XMP packet that does not parse
+  // (GetXMP then gives only the metadata outside it).
+  bool PacketUnreadable() const;
 
   // ---- Process-wide ----
   // Counted start of the file part (it also holds a start of the core).

@@ -173,7 +173,8 @@ bool LooksUTF8(std::string_view text) {
 
 }  // namespace
 
-bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layout) {
+bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layout, bool* refused) {
+  if (refused) *refused = true;
   // Trailing NULs are padding some writers leave after an 8-bit packet; the
   // toolkit ignores them.
   const bool wide = text.size() >= 2 && (text[0] == '\0' || text[1] == '\0' ||
@@ -192,6 +193,7 @@ bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layou
   handler.SetParser(parser.get());
   if (!parser->ParseBuffer(text)) {
     if (problem) *problem = parser->ErrorMessage();
+    if (refused) *refused = parser->Refused();
     return false;
   }
   if (layout && (!LooksUTF8(text) || layout->descriptions.empty())) layout->editable = false;

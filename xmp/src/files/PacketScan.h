@@ -50,7 +50,9 @@ struct PacketLayout {
 // together, since the toolkit merges them into one schema node), at most
 // kMaxPacketBytes, no DOCTYPE, well-formed XML in a valid encoding. False
 // with the reason when refused. With layout, also records the layout.
-bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layout = nullptr);
+// refused, when given, tells a refusal (limits, DOCTYPE) from malformed XML.
+bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layout = nullptr,
+                bool* refused = nullptr);
 
 }  // namespace detail
 }  // namespace ovraxmp
