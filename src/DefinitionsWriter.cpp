@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <charconv>
 
-#include <ovracore/FileSupport.h>
 #include <ovrametadata/Definitions.h>
 
+#include "InitializeInternal.h"
 #include "XMLTextWriter.h"
 
 namespace ovrametadata {
@@ -105,16 +105,6 @@ void WriteType(XMLTextWriter& out, const TypeDefinition& type, int level) {
   out.Close(level, "xmp_type");
 }
 
-// A new file renamed over the old one: a failed write never leaves half a
-// definitions file. False only when the folder cannot be made.
-bool Store(const UTF16String& path, const UTF8String& text) {
-  namespace fs = ovracore::filesupport;
-  const fs::File file(path);
-  if (!fs::FileUtils::EnsureDirectoryExists(fs::Dir(file.FSPath().parent_path()))) return false;
-  fs::SafeSave(path, text);
-  return true;
-}
-
 }  // namespace
 
 UTF8String WriteDefinitionsToBuffer(Range<SchemaDefinitionPtr> schemas, Range<TypeDefinitionPtr> types) {
@@ -130,7 +120,8 @@ UTF8String WriteDefinitionsToBuffer(Range<SchemaDefinitionPtr> schemas, Range<Ty
 }
 
 bool WriteSchemaFile(DefinitionsPair const& definitions, UTF16String const& path) {
-  return Store(path, WriteDefinitionsToBuffer(Range<SchemaDefinitionPtr>(definitions.first),
+  // A failed write never leaves half a definitions file.
+  return StoreText(path, WriteDefinitionsToBuffer(Range<SchemaDefinitionPtr>(definitions.first),
                                               Range<TypeDefinitionPtr>(definitions.second)));
 }
 

@@ -73,4 +73,12 @@ bool IsSchemaExcludedFromGlobal(UTF16String const& fileName) {
   return fileName == u"DICOM.xml" || fileName == u"Mobile.xml";
 }
 
+bool StoreText(UTF16String const& path, UTF8String const& text, bool* written) {
+  namespace fs = ovracore::filesupport;
+  if (!fs::FileUtils::EnsureDirectoryExists(Dir(fs::File(path).FSPath().parent_path()))) return false;
+  const bool saved = fs::SafeSave(path, text);
+  if (written) *written = saved;
+  return true;
+}
+
 }  // namespace ovrametadata

@@ -47,4 +47,9 @@ void LoadDefinitionsDirectory(UTF16String const& folder,
 // or dynamic list and under the file's path.
 void LoadDefinitionsFromFile(ovracore::filesupport::File const& file, bool isCustomFolder);
 
+// Writes text to path through safe save (a new file renamed over the old
+// one), making the folder first. False only when the folder cannot be made;
+// written, when given, says whether the file was written.
+bool StoreText(UTF16String const& path, UTF8String const& text, bool* written = nullptr);
+
 }  // namespace ovrametadata

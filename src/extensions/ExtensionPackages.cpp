@@ -152,8 +152,6 @@ bool ParseExtensionManifestFromDocument(const UTF16String& path, ExtensionManife
 }
 
 bool WriteExtensionManifest(const GenericPanelManifestParser::ManifestInfo& info, const UTF16String& path) {
-  const File file(path);
-  if (!ovracore::filesupport::FileUtils::EnsureDirectoryExists(Dir(file.FSPath().parent_path()))) return false;
   const auto attribute = [](const char* name, const UTF16String& value) {
     return UTF8String(" ") + name + "=\"" + ovracore::EncodeXMLReserved(ovracore::ToUTF8(value)) + "\"";
   };
@@ -161,7 +159,8 @@ bool WriteExtensionManifest(const GenericPanelManifestParser::ManifestInfo& info
                           attribute("xmlns", ovracore::ToUTF16(kExtensionNamespace)) +
                           attribute("name", info.name) + attribute("version", info.version) +
                           attribute("locFilePrefix", info.localizationFile) + " />\n";
-  return ovracore::filesupport::SafeSave(path, text);
+  bool written = false;
+  return StoreText(path, text, &written) && written;
 }
 
 void RegisterExtensionPackages(const UTF16String& folder) {

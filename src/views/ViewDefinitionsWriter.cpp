@@ -3,9 +3,9 @@
 // definitions, so that a panel falls back to the definitions' texts.
 #include <map>
 
-#include <ovracore/FileSupport.h>
 #include <ovrametadata/Views.h>
 
+#include "InitializeInternal.h"
 #include "XMLTextWriter.h"
 #include "views/ViewsInternal.h"
 
@@ -158,11 +158,8 @@ bool WriteViewDefinitionsFileFromSchema(const std::vector<SchemaDefinitionPtr>& 
     out.Close(1, "view");
     out.Close(0, "views");
   }
-  namespace fs = ovracore::filesupport;
-  if (!fs::FileUtils::EnsureDirectoryExists(fs::Dir(fs::File(path).FSPath().parent_path()))) return false;
-  // A new file renamed over the old one: never half a view file.
-  fs::SafeSave(path, out.Text());
-  return true;
+  // Never half a view file.
+  return StoreText(path, out.Text());
 }
 
 }  // namespace ovrametadata
