@@ -349,3 +349,32 @@ TEST_F(XMPProperties, OrdinaryOperationsPrintNothingOnStderr) {
   }
   EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
 }
+
+// The toolkit gives the other item of a two-item language alternative the
+// "x-default" text, when it parses and when it serialises.
+TEST_F(XMPProperties, TwoItemLanguageAlternativeKeepsItsOtherText) {
+  const std::string packet =
+      "<x:xmpmeta xmlns:x=\"adobe:ns:meta/\"><rdf:RDF xmlns:rdf=\"http://www.w3.org/1999/02/22-rdf-syntax-ns#\">"
+      "<rdf:Description rdf:about=\"\" xmlns:dc=\"http://purl.org/dc/elements/1.1/\">"
+      "<dc:title><rdf:Alt><rdf:li xml:lang=\"de\">Hallo &amp; tsch&#xFC;ss</rdf:li>"
+      "<rdf:li xml:lang=\"x-default\">Hello</rdf:li></rdf:Alt></dc:title>"
+      "<dc:rights><rdf:Alt><rdf:li xml:lang=\"x-default\">Same</rdf:li><rdf:li xml:lang=\"fr\">Same</rdf:li></rdf:Alt>"
+      "</dc:rights></rdf:Description></rdf:RDF></x:xmpmeta>";
+  XMPMeta meta = xmptest::Parse(packet);
+  const auto expectTexts = [](const XMPMeta& m, const char* when) {
+    EXPECT_EQ(Get(m, kXMP_NS_DC, "title[1]"), "Hello") << when;
+    EXPECT_EQ(Get(m, kXMP_NS_DC, "title[2]"), "Hallo & tschüss") << when;
+    EXPECT_EQ(Get(m, kXMP_NS_DC, "rights[2]"), "Same") << when;
+  };
+  expectTexts(meta, "parsed");
+  expectTexts(meta.Clone(), "cloned");
+  std::string exact;
+  meta.SerializeToBuffer(&exact, kXMP_ExactPacketLength, 4000);
+  EXPECT_EQ(exact.size(), 4000u);
+  expectTexts(meta, "after serialising");
+  expectTexts(xmptest::Parse(exact), "reparsed");
+  meta.SetArrayItem(kXMP_NS_DC, "title", 1, "Hi");
+  const XMPMeta changed = xmptest::Parse(xmptest::Serialize(meta));
+  EXPECT_EQ(Get(changed, kXMP_NS_DC, "title[1]"), "Hi");
+  EXPECT_EQ(Get(changed, kXMP_NS_DC, "title[2]"), "Hallo & tschüss");
+}

@@ -2,6 +2,7 @@
 // qualifier and localised-text operations. Every call tests registration
 // and node kind first, because the toolkit reports its failures on stderr.
 #include <algorithm>
+#include <cctype>
 #include <string>
 
 #include <ovraxmp/XMPMeta.h>
@@ -185,17 +186,194 @@ bool GetConverted(const XMPMeta& meta, const std::string& ns, const std::string&
 }  // namespace
 
 namespace detail {
-XmpPtr DeepCopy(XmpPtr xmp) {
+
+namespace {
+
+bool SameLanguage(const std::string& a, const std::string& b) {
+  return a.size() == b.size() && std::equal(a.begin(), a.end(), b.begin(), [](char x, char y) {
+           return std::tolower(static_cast<unsigned char>(x)) == std::tolower(static_cast<unsigned char>(y));
+         });
+}
+
+std::string LocalName(const std::string& path) {
+  const auto slash = path.rfind('/');
+  const std::string last = slash == std::string::npos ? path : path.substr(slash + 1);
+  return last.substr(last.find(':') + 1);
+}
+
+}  // namespace
+
+// Language alternatives of exactly two items, "x-default" and another, in
+// document order: the toolkit's reader and serialiser give the other item
+// the default's text.
+struct TwoItemAlternative {
+  std::string ns, path;
+  int other = 0;  // 1-based index of the item that is not "x-default"
+  std::string language, defaultText, text;
+};
+
+std::vector<TwoItemAlternative> TwoItemAlternatives(XmpPtr xmp) {
+  std::vector<TwoItemAlternative> found;
+  std::vector<std::pair<std::string, std::string>> arrays;  // namespace, path
+  {
+    XmpIteratorPtr walk = xmp_iterator_new(xmp, nullptr, nullptr, XMP_ITER_OMITQUALIFIERS);
+    if (!walk) return found;
+    XmpString ns, path, value;
+    uint32_t options = 0;
+    while (xmp_iterator_next(walk, ns, path, value, &options)) {
+      if (options & kXMP_PropArrayIsAltText) arrays.emplace_back(ns.str(), path.str());
+    }
+    xmp_iterator_free(walk);
+  }
+  for (auto& array : arrays) {
+    const char* ns = array.first.c_str();
+    const std::string& path = array.second;
+    if (!xmp_has_property(xmp, ns, (path + "[2]").c_str()) || xmp_has_property(xmp, ns, (path + "[3]").c_str()))
+      continue;
+    std::string languages[2], texts[2];
+    XmpString text;
+    uint32_t options = 0;
+    for (int i = 0; i < 2; ++i) {
+      const std::string item = path + "[" + std::to_string(i + 1) + "]";
+      if (xmp_get_property(xmp, ns, (item + "/?xml:lang").c_str(), text, &options)) languages[i] = text.str();
+      if (xmp_get_property(xmp, ns, item.c_str(), text, &options)) texts[i] = text.str();
+    }
+    const int other = languages[0] == "x-default" ? 1 : 0;
+    if (languages[1 - other] != "x-default" || languages[other] == "x-default") continue;
+    found.push_back({std::move(array.first), std::move(array.second), other + 1, languages[other],
+                     texts[1 - other], texts[other]});
+  }
+  return found;
+}
+
+bool AnyEqual(const std::vector<TwoItemAlternative>& alternatives) {
+  return std::any_of(alternatives.begin(), alternatives.end(),
+                     [](const TwoItemAlternative& alt) { return alt.text == alt.defaultText; });
+}
+
+void RestoreTwoLanguageAlternatives(XmpPtr xmp, std::vector<TwoLanguageAlternative> written) {
+  written.erase(std::remove_if(written.begin(), written.end(),
+                               [](const TwoLanguageAlternative& w) { return w.text == w.defaultText; }),
+                written.end());
+  if (written.empty()) return;
+  for (const TwoItemAlternative& alt : TwoItemAlternatives(xmp)) {
+    if (alt.text != alt.defaultText) continue;
+    const std::string name = LocalName(alt.path);
+    const auto found = std::find_if(written.begin(), written.end(), [&](const TwoLanguageAlternative& w) {
+      return w.name == name && w.defaultText == alt.text && SameLanguage(w.language, alt.language);
+    });
+    if (found == written.end()) continue;
+    xmp_set_array_item(xmp, alt.ns.c_str(), alt.path.c_str(), alt.other, found->text.c_str(), 0);
+    written.erase(found);
+  }
+}
+
+namespace {
+
+// A parse of text the layer has checked before, repaired as ParseFromBuffer
+// repairs: the scan runs only when the parse left equal texts behind.
+void RepairParsed(XmpPtr xmp, std::string_view text) {
+  if (!AnyEqual(TwoItemAlternatives(xmp))) return;
+  std::vector<TwoLanguageAlternative> written;
+  if (ScanPacket(text, nullptr, nullptr, nullptr, &written)) RestoreTwoLanguageAlternatives(xmp, std::move(written));
+}
+
+// Gives the other items their texts again (the serialiser overwrites them
+// in the packet it writes out, too).
+void PutBack(XmpPtr xmp, const std::vector<TwoItemAlternative>& alternatives) {
+  XmpString now;
+  uint32_t options = 0;
+  for (const TwoItemAlternative& alt : alternatives) {
+    const std::string item = alt.path + "[" + std::to_string(alt.other) + "]";
+    if (alt.text != alt.defaultText && xmp_get_property(xmp, alt.ns.c_str(), item.c_str(), now, &options) &&
+        now.str() != alt.text)
+      xmp_set_array_item(xmp, alt.ns.c_str(), alt.path.c_str(), alt.other, alt.text.c_str(), 0);
+  }
+}
+
+std::string EscapedContent(const std::string& text) {
+  std::string out;
+  for (const char c : text) {
+    switch (c) {
+      case '&': out += "&amp;"; break;
+      case '<': out += "&lt;"; break;
+      case '>': out += "&gt;"; break;
+      case '\r': out += "&#xD;"; break;
+      default: out += c;
+    }
+  }
+  return out;
+}
+
+// Puts the other items' texts into what the serialiser wrote. An exact
+// length is kept by taking the difference from the padding.
+void PatchSerialized(const std::vector<TwoItemAlternative>& alternatives, std::string& text, bool exactLength) {
+  std::vector<TwoLanguageAlternative> written;
+  if (!ScanPacket(text, nullptr, nullptr, nullptr, &written) || written.size() != alternatives.size())
+    Throw(kXMPErr_BadSerialize, "serialising a language alternative");
+  std::ptrdiff_t grown = 0;
+  for (std::size_t i = alternatives.size(); i-- > 0;) {
+    const TwoItemAlternative& alt = alternatives[i];
+    const TwoLanguageAlternative& w = written[i];
+    if (w.text == alt.text) continue;
+    if (w.textBegin == w.textEnd && !w.text.empty()) Throw(kXMPErr_BadSerialize, "serialising a language alternative");
+    const std::string content = EscapedContent(alt.text);
+    text.replace(w.textBegin, w.textEnd - w.textBegin, content);
+    grown += static_cast<std::ptrdiff_t>(content.size()) - static_cast<std::ptrdiff_t>(w.textEnd - w.textBegin);
+  }
+  if (!exactLength || grown == 0) return;
+  const std::size_t trailer = text.rfind("<?xpacket end=");
+  if (trailer == std::string::npos) Throw(kXMPErr_BadSerialize, "the packet does not fit its length");
+  std::size_t padding = trailer;
+  while (padding > 0 && (text[padding - 1] == ' ' || text[padding - 1] == '\n')) --padding;
+  if (grown < 0) {
+    text.insert(padding, static_cast<std::size_t>(-grown), ' ');
+    return;
+  }
+  std::size_t removed = 0;
+  for (std::size_t at = trailer; at-- > padding && removed < static_cast<std::size_t>(grown);) {
+    if (text[at] == ' ') {
+      text.erase(at, 1);
+      ++removed;
+    }
+  }
+  if (removed < static_cast<std::size_t>(grown)) Throw(kXMPErr_BadSerialize, "the packet does not fit its length");
+}
+
+}  // namespace
+
+// The toolkit's serialiser, which gives the other item of a two-item
+// language alternative the default's text, in what it writes and in the
+// packet itself: both are put right.
+bool Serialize(XmpPtr xmp, std::string* out, XMP_OptionBits options, std::uint32_t padding,
+               const std::string& newline, const std::string& indent, std::int32_t baseIndent) {
+  const std::vector<TwoItemAlternative> alternatives = TwoItemAlternatives(xmp);
   XmpString text;
-  if (!xmp_serialize(xmp, text, kXMP_OmitPacketWrapper | kXMP_UseCompactFormat | kXMP_OmitAllFormatting, 0))
+  const bool ok = (newline.empty() && indent.empty() && baseIndent == 0)
+                      ? xmp_serialize(xmp, text, options, padding)
+                      : xmp_serialize_and_format(xmp, text, options, padding, newline.c_str(), indent.c_str(),
+                                                 baseIndent);
+  const bool differ = std::any_of(alternatives.begin(), alternatives.end(),
+                                  [](const TwoItemAlternative& a) { return a.text != a.defaultText; });
+  if (differ) PutBack(xmp, alternatives);
+  if (!ok) return false;
+  *out = text.str();
+  if (differ) PatchSerialized(alternatives, *out, (options & kXMP_ExactPacketLength) != 0);
+  return true;
+}
+
+XmpPtr DeepCopy(XmpPtr xmp) {
+  std::string text;
+  if (!Serialize(xmp, &text, kXMP_OmitPacketWrapper | kXMP_UseCompactFormat | kXMP_OmitAllFormatting, 0, {}, {}, 0))
     ThrowLastError(kXMPErr_BadSerialize, "copying an XMP packet");
   XmpPtr copy = xmp_new_empty();
   if (!copy) ThrowLastError(kXMPErr_NoMemory, "copying an XMP packet");
-  if (!xmp_parse(copy, xmp_string_cstr(text), xmp_string_len(text))) {
+  if (!xmp_parse(copy, text.data(), text.size())) {
     const int id = xmp_get_error();
     xmp_free(copy);
     Throw(id != 0 ? id : kXMPErr_BadParse, "copying an XMP packet");
   }
+  RepairParsed(copy, text);
   return copy;
 }
 
@@ -216,6 +394,7 @@ void ParseUnchecked(XMPMeta& meta, const std::string& text) {
     xmp_free(fresh);
     Throw(id != 0 ? id : kXMPErr_BadParse, "parsing XMP");
   }
+  if (!text.empty()) RepairParsed(fresh, text);
   packet.BeforeChange();
   packet.ReplaceXmp(fresh);
   packet.Marks().clear();
@@ -263,6 +442,7 @@ void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_Option
   XmpPtr fresh = xmp_new_empty();
   if (!fresh) detail::ThrowLastError(kXMPErr_NoMemory, "creating an XMP packet");
   bool ok = true;
+  std::vector<detail::TwoLanguageAlternative> alternatives;
   if (buffer && length > 0) {
     const std::string_view view(buffer, length);
     std::string wrapped;
@@ -278,13 +458,16 @@ void XMPMeta::ParseFromBuffer(const char* buffer, std::size_t length, XMP_Option
     // stderr).
     std::string problem;
     bool refused = true;
-    if (!detail::ScanPacket(std::string_view(buffer, length), &problem, nullptr, &refused)) {
+    if (!detail::ScanPacket(std::string_view(buffer, length), &problem, nullptr, &refused, &alternatives)) {
       xmp_free(fresh);
       // Malformed XML is what the toolkit's own readers cope with; what the
       // check refuses (nesting, sizes, DOCTYPE) they must never see.
       detail::Throw(refused ? kXMPErr_BadXMP : kXMPErr_BadXML, "parsing XMP: " + problem);
     }
     ok = xmp_parse(fresh, buffer, length);
+    // The toolkit's reader copies the default text over the other item of
+    // a two-item language alternative.
+    if (ok && !alternatives.empty()) detail::RestoreTwoLanguageAlternatives(fresh, std::move(alternatives));
   }
   if (!ok) {
     const int id = xmp_get_error();
@@ -319,13 +502,8 @@ void XMPMeta::SerializeToBuffer(std::string* out, XMP_OptionBits options, std::u
       return;
     }
   }
-  XmpString text;
-  const bool ok = (newline.empty() && indent.empty() && baseIndent == 0)
-                      ? xmp_serialize(toWrite, text, options, padding)
-                      : xmp_serialize_and_format(toWrite, text, options, padding, newline.c_str(),
-                                                 indent.c_str(), baseIndent);
-  if (!ok) detail::ThrowLastError(kXMPErr_BadSerialize, "serialising XMP");
-  *out = text.str();
+  if (!detail::Serialize(toWrite, out, options, padding, newline, indent, baseIndent))
+    detail::ThrowLastError(kXMPErr_BadSerialize, "serialising XMP");
 }
 
 XMPMeta XMPMeta::Clone(XMP_OptionBits) const {

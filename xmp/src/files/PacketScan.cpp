@@ -11,6 +11,7 @@ namespace detail {
 namespace {
 
 constexpr std::string_view kRDF = "http://www.w3.org/1999/02/22-rdf-syntax-ns#";
+constexpr std::string_view kXML = "http://www.w3.org/XML/1998/namespace";
 
 bool IsSpace(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\n'; }
 
@@ -23,9 +24,25 @@ struct Open {
   std::size_t tagEnd;
 };
 
+bool IsDefaultLanguage(std::string_view tag) {
+  return tag.size() == 9 && (tag == "x-default" || tag == "X-DEFAULT" || tag == "x-Default");
+}
+
+// Collects the items of one rdf:Alt (see TwoLanguageAlternative).
+struct AltItems {
+  std::size_t depth = 0;  // its place in the open elements, 0 when none is open
+  bool usable = true;     // only simple items with a language
+  std::string name;
+  std::vector<std::pair<std::string, std::string>> items;  // tag, text
+  std::vector<std::pair<std::size_t, std::size_t>> spans;  // of each item's content
+  bool inItem = false;
+};
+
 class ScanHandler : public ovracore::AbstractParseHandler {
  public:
-  ScanHandler(std::string_view text, PacketLayout* layout) : mText(text), mLayout(layout) {}
+  ScanHandler(std::string_view text, PacketLayout* layout,
+              std::vector<TwoLanguageAlternative>* alternatives)
+      : mText(text), mLayout(layout), mAlternatives(alternatives) {}
   void SetParser(const ovracore::Parser* parser) { mParser = parser; }
 
   void StartPrefixMapping(const ovracore::UTF8String& prefix, const ovracore::UTF8String& uri) override {
@@ -60,6 +77,7 @@ class ScanHandler : public ovracore::AbstractParseHandler {
     const std::size_t begin = mParser->CurrentByteIndex();
     const std::size_t tagEnd = begin + mParser->CurrentByteCount();
     mOpen.push_back({kind, own, begin, tagEnd});
+    if (mAlternatives) StartForAlternatives(rdfName, local, attributes);
     if (!mLayout) return;
     if (kind == Kind::kTopDescription) RecordDescription(begin, tagEnd);
     if (kind == Kind::kTopProperty) {
@@ -72,8 +90,13 @@ class ScanHandler : public ovracore::AbstractParseHandler {
     }
   }
 
+  void Characters(const ovracore::UTF8String& text) override {
+    if (mAlt.inItem) mAlt.items.back().second += text;
+  }
+
   void EndElement(const ovracore::UTF8String&, const ovracore::UTF8String&) override {
     if (mOpen.empty()) return;
+    if (mAlt.depth != 0) EndForAlternatives();
     const Open open = mOpen.back();
     mOpen.pop_back();
     if (!mLayout) return;
@@ -95,6 +118,52 @@ class ScanHandler : public ovracore::AbstractParseHandler {
     count += std::min<std::uint32_t>(more, kMaxPropertiesPerNode + 1);
     if (count > kMaxPropertiesPerNode)
       throw ovracore::ParseAbort("more than " + std::to_string(kMaxPropertiesPerNode) + " properties on one node");
+  }
+
+  void StartForAlternatives(bool rdfName, const ovracore::UTF8String& local,
+                            const ovracore::Attributes& attributes) {
+    if (!rdfName) {
+      if (mAlt.depth != 0) mAlt.usable = false;
+      mLastName = local;
+      return;
+    }
+    if (local == "Alt") {
+      if (mAlt.depth != 0) {
+        mAlt.usable = false;  // nested: not a language alternative
+        return;
+      }
+      mAlt = AltItems();
+      mAlt.depth = mOpen.size();
+      mAlt.name = mLastName;
+    } else if (mAlt.depth != 0) {
+      const auto language = attributes.Find("lang", kXML);
+      if (local != "li" || mOpen.size() != mAlt.depth + 1 || !language) {
+        mAlt.usable = false;
+        return;
+      }
+      mAlt.items.emplace_back(*language, std::string());
+      mAlt.spans.emplace_back(mOpen.back().tagEnd, mOpen.back().tagEnd);
+      mAlt.inItem = true;
+    }
+  }
+
+  void EndForAlternatives() {
+    // mOpen still holds the element that ends.
+    if (mOpen.size() == mAlt.depth + 1) {
+      if (mAlt.inItem && mParser->CurrentByteCount() != 0) mAlt.spans.back().second = mParser->CurrentByteIndex();
+      mAlt.inItem = false;
+      return;
+    }
+    if (mOpen.size() != mAlt.depth) return;
+    const auto& items = mAlt.items;
+    if (mAlt.usable && items.size() == 2 && IsDefaultLanguage(items[0].first) != IsDefaultLanguage(items[1].first)) {
+      const bool defaultFirst = IsDefaultLanguage(items[0].first);
+      const auto& other = items[defaultFirst ? 1 : 0];
+      const auto& standard = items[defaultFirst ? 0 : 1];
+      const auto& span = mAlt.spans[defaultFirst ? 1 : 0];
+      mAlternatives->push_back({mAlt.name, other.first, standard.second, other.second, span.first, span.second});
+    }
+    mAlt = AltItems();
   }
 
   std::string Resolve(std::string_view prefix, const std::map<std::string, std::string>& scope) const {
@@ -149,6 +218,9 @@ class ScanHandler : public ovracore::AbstractParseHandler {
   std::vector<Open> mOpen;
   std::uint32_t mTopLevel = 0;  // properties of every top-level rdf:Description
   std::vector<std::pair<std::string, std::string>> mBindings;
+  std::vector<TwoLanguageAlternative>* mAlternatives;
+  AltItems mAlt;
+  std::string mLastName;  // of the last element outside the RDF namespace
 };
 
 // Edits insert UTF-8 text, so only UTF-8 packets can be edited in place.
@@ -173,7 +245,8 @@ bool LooksUTF8(std::string_view text) {
 
 }  // namespace
 
-bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layout, bool* refused) {
+bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layout, bool* refused,
+                std::vector<TwoLanguageAlternative>* alternatives) {
   if (refused) *refused = true;
   // Trailing NULs are padding some writers leave after an 8-bit packet; the
   // toolkit ignores them.
@@ -185,7 +258,8 @@ bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layou
     return false;
   }
   if (layout) *layout = PacketLayout();
-  ScanHandler handler(text, layout);
+  if (alternatives) alternatives->clear();
+  ScanHandler handler(text, layout, alternatives);
   ovracore::ParserLimits limits;
   limits.maxDepth = kMaxNestingDepth;
   limits.maxBytes = kMaxPacketBytes;

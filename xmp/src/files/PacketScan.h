@@ -44,6 +44,18 @@ struct PacketLayout {
   bool editable = true;
 };
 
+// A language alternative of exactly two items, "x-default" and one other,
+// as written. The toolkit's reader and its serialiser both give such an
+// other item the default's text; the layer puts the right text back.
+struct TwoLanguageAlternative {
+  std::string name;      // local name of the property or field that holds it
+  std::string language;  // the other item's tag
+  std::string defaultText, text;
+  // Where the other item's content is written; equal when it cannot be
+  // replaced in place (an empty-element tag).
+  std::size_t textBegin = 0, textEnd = 0;
+};
+
 // Checks the packet: nesting up to kMaxNestingDepth, at most
 // kMaxPropertiesPerNode properties on one node (child elements and
 // attributes; the properties of every top-level rdf:Description count
@@ -51,8 +63,10 @@ struct PacketLayout {
 // kMaxPacketBytes, no DOCTYPE, well-formed XML in a valid encoding. False
 // with the reason when refused. With layout, also records the layout.
 // refused, when given, tells a refusal (limits, DOCTYPE) from malformed XML.
+// alternatives, when given, gets every TwoLanguageAlternative, in document
+// order.
 bool ScanPacket(std::string_view text, std::string* problem, PacketLayout* layout = nullptr,
-                bool* refused = nullptr);
+                bool* refused = nullptr, std::vector<TwoLanguageAlternative>* alternatives = nullptr);
 
 }  // namespace detail
 }  // namespace ovraxmp
