@@ -8,6 +8,8 @@
 // packet (the providers' access guards do).
 #pragma once
 
+#include <vector>
+
 #include <ovrametadata/Common.h>
 #include <ovrametadata/Definitions.h>
 #include <ovrametadata/Paths.h>
@@ -72,5 +74,48 @@ OVRAMETADATA_EXPORT bool SetValue(XMPMetaRef xmp, const Path& path, const UTF8St
 inline bool SetValue(XMPMetaRef xmp, const Path& path, const char* value) {
   return SetValue(xmp, path, UTF8String(value ? value : ""));
 }
+
+// ---- Language alternatives, one language at a time ----
+// The functions above read and write the "x-default" item; these reach the
+// others. Tags compare without regard to case.
+
+// The languages of the alternative at path, in stored order ("x-default"
+// included); empty when it is absent.
+OVRAMETADATA_EXPORT std::vector<UTF8String> GetAltTextLanguages(XMPMetaRef xmp, const Path& path);
+// The item of exactly that language: no other language stands in for it.
+OVRAMETADATA_EXPORT bool GetAltTextValue(XMPMetaRef xmp, const Path& path,
+                                         const UTF8String& language, UTF8String& value,
+                                         GetValueResult* result = nullptr);
+// Writes the item of that language only, adding it when absent (a new
+// alternative gets an "x-default" item with the same text). False, with a
+// report, when the definition of path is not a language alternative or the
+// tag is not one ("en", "de-CH").
+OVRAMETADATA_EXPORT bool SetAltTextValue(XMPMetaRef xmp, const Path& path,
+                                         const UTF8String& language, const UTF8String& value);
+
+// ---- What a packet stores, read without definitions ----
+// For namespaces the definitions do not describe: the functions above need
+// a definition, these show what is there.
+
+struct StoredNamespace {
+  UTF8String namespaceURI;
+  UTF8String prefix;  // the prefix the toolkit knows it by, without colon
+};
+
+// One stored node: a simple value, a structure or an array.
+struct StoredNode {
+  enum Kind { kSimple, kStruct, kArray };
+  Kind kind = kSimple;
+  UTF8String name;      // "lr:hierarchicalSubject", "stDim:w"; "[2]" for an item
+  UTF8String value;     // of a simple value
+  UTF8String language;  // the value's xml:lang, when it has one
+  std::vector<StoredNode> children;  // fields or items, in stored order
+};
+
+// The namespaces that hold properties in the packet, in its order.
+OVRAMETADATA_EXPORT std::vector<StoredNamespace> GetStoredNamespaces(XMPMetaRef xmp);
+// The properties stored in namespaceURI, in order; empty when none.
+OVRAMETADATA_EXPORT std::vector<StoredNode> GetStoredNodes(XMPMetaRef xmp,
+                                                           const UTF8String& namespaceURI);
 
 }  // namespace ovrametadata

@@ -94,6 +94,13 @@ void FileProvider::ReloadFile() {
                                     "read; only the metadata stored outside it is shown."),
                   mFilePath);
       }
+      for (const std::string& note : file.ToolkitNotes()) {
+        SendError(kErrorReadingXMP,
+                  ovracore::ZString("$$$/ovrametadata/FileProvider/NativeMetadataNote=the metadata outside the XMP "
+                                    "packet is not read completely (#{quot}@0#{quot}).",
+                                    {note}),
+                  mFilePath);
+      }
       // The handler closes the file when it goes.
     } catch (...) {
       // An unreadable file is a provider without metadata; not reported.

@@ -3,6 +3,8 @@
 #include <ovrametadata/Values.h>
 
 #include <algorithm>
+#include <cctype>
+#include <charconv>
 #include <cstdint>
 #include <exception>
 #include <utility>
@@ -91,6 +93,74 @@ struct AltText {
                           value);
   }
 };
+
+// One language of an alternative, matched exactly: no fallback to another
+// language, and writing it leaves every other item as it is.
+struct LanguageText {
+  static constexpr bool kReadsAbsentAsFalse = true;
+  UTF8String language;
+
+  // The 1-based index of the item, 0 when there is none.
+  ovraxmp::XMP_Index Find(const XMPMeta& meta, const Path& path) const {
+    if (!meta.DoesPropertyExist(path.namespaceURI, path.description)) return 0;
+    const ovraxmp::XMP_Index count = meta.CountArrayItems(path.namespaceURI, path.description);
+    std::string tag;
+    for (ovraxmp::XMP_Index i = 1; i <= count; ++i) {
+      if (meta.GetProperty(path.namespaceURI, ItemLanguagePath(path, i), &tag) &&
+          ovracore::EqualsIgnoreCaseASCII(tag, language)) {
+        return i;
+      }
+    }
+    return 0;
+  }
+  static std::string ItemLanguagePath(const Path& path, ovraxmp::XMP_Index index) {
+    return path.description + "[" + std::to_string(index) + "]/?xml:lang";
+  }
+  bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
+    const ovraxmp::XMP_Index index = Find(meta, path);
+    return index > 0 && meta.GetArrayItem(path.namespaceURI, path.description, index, &out);
+  }
+  void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
+    const ovraxmp::XMP_Index index = Find(meta, path);
+    if (index > 0) {
+      meta.SetArrayItem(path.namespaceURI, path.description, index, value);
+    } else if (!meta.DoesPropertyExist(path.namespaceURI, path.description) ||
+               meta.CountArrayItems(path.namespaceURI, path.description) == 0) {
+      // A new alternative gets its "x-default" item as well.
+      meta.SetLocalizedText(path.namespaceURI, path.description, std::string(), language, value);
+    } else {
+      meta.AppendArrayItem(path.namespaceURI, path.description, kAltTextOptions, value);
+      const auto count = meta.CountArrayItems(path.namespaceURI, path.description);
+      meta.SetProperty(path.namespaceURI, ItemLanguagePath(path, count), language);
+    }
+  }
+  static constexpr ovraxmp::XMP_OptionBits kAltTextOptions =
+      ovraxmp::kXMP_PropValueIsArray | ovraxmp::kXMP_PropArrayIsOrdered |
+      ovraxmp::kXMP_PropArrayIsAlternate | ovraxmp::kXMP_PropArrayIsAltText;
+};
+
+// "en", "de-CH", "x-default": subtags of one to eight letters or digits.
+bool IsLanguageTag(const UTF8String& tag) {
+  if (tag.empty() || !std::isalpha(static_cast<unsigned char>(tag.front()))) return false;
+  std::size_t run = 0;
+  for (const char c : tag) {
+    if (c == '-') {
+      if (run == 0) return false;
+      run = 0;
+    } else if (std::isalnum(static_cast<unsigned char>(c)) && ++run <= 8) {
+      continue;
+    } else {
+      return false;
+    }
+  }
+  return run > 0;
+}
+
+bool IsAltTextEntry(const Path& path) {
+  const auto entry = PathEntryDefinition(path);
+  const auto primitive = entry ? detail::PrimitiveTypeOfEntry(*entry) : boost::none;
+  return primitive && *primitive == kPrimitiveType_alt;
+}
 
 // Read as text and normalised through the toolkit's date conversion.
 struct DateText {
@@ -279,10 +349,25 @@ bool IsAmongChoices(const EntryDefinition& entry, const UTF8String& text) {
     type = TypeIdDefinition(*entry.type);
     if (type) choices = &type->constraints.choices;
   }
-  return std::any_of(choices->begin(), choices->end(),
-                     [&](const boost::shared_ptr<ChoiceDefinition>& choice) {
-                       return choice && choice->rawValue == text;
-                     });
+  if (std::any_of(choices->begin(), choices->end(), [&](const boost::shared_ptr<ChoiceDefinition>& choice) {
+        return choice && choice->rawValue == text;
+      })) {
+    return true;
+  }
+  // Numbers are the same choice in any form: a rating written "5.0" is "5".
+  const auto number = [](const UTF8String& t) -> boost::optional<double> {
+    double value = 0;
+    const auto [end, error] = std::from_chars(t.data(), t.data() + t.size(), value);
+    if (t.empty() || error != std::errc() || end != t.data() + t.size()) return boost::none;
+    return value;
+  };
+  const auto& element =
+      entry.constraints.elementType || !type ? entry.constraints.elementType : type->constraints.elementType;
+  const bool numeric = element && (*element == "real" || *element == "integer");
+  const auto value = numeric ? number(text) : boost::none;
+  return value && std::any_of(choices->begin(), choices->end(), [&](const boost::shared_ptr<ChoiceDefinition>& c) {
+           return c && number(c->rawValue) == value;
+         });
 }
 
 bool IsValidBooleanText(XMPMetaRef xmp, const Path& path, const UTF8String& text) {
@@ -455,6 +540,42 @@ bool SetValue(XMPMetaRef xmp, const Path& path, const UTF8String& value) {
     default:
       return WriteValue(xmp, path, value, SimpleText());
   }
+}
+
+// ---------------------------------------------------------------------------
+// Language alternatives
+
+std::vector<UTF8String> GetAltTextLanguages(XMPMetaRef xmp, const Path& path) {
+  std::vector<UTF8String> languages;
+  if (!xmp) return languages;
+  try {
+    const XMPMeta meta(xmp);
+    if (!meta.DoesPropertyExist(path.namespaceURI, path.description)) return languages;
+    const auto count = meta.CountArrayItems(path.namespaceURI, path.description);
+    std::string tag;
+    for (ovraxmp::XMP_Index i = 1; i <= count; ++i) {
+      if (meta.GetProperty(path.namespaceURI, LanguageText::ItemLanguagePath(path, i), &tag)) {
+        languages.push_back(tag);
+      }
+    }
+  } catch (...) {
+    ReportInvalidData(kErrorReadingXMP, path);
+  }
+  return languages;
+}
+
+bool GetAltTextValue(XMPMetaRef xmp, const Path& path, const UTF8String& language,
+                     UTF8String& value, GetValueResult* result) {
+  return ReadValue(xmp, path, value, result, LanguageText{language});
+}
+
+bool SetAltTextValue(XMPMetaRef xmp, const Path& path, const UTF8String& language,
+                     const UTF8String& value) {
+  if (!IsLanguageTag(language) || !IsAltTextEntry(path)) {
+    ReportInvalidData(kErrorWritingXMP, path);
+    return false;
+  }
+  return WriteValue(xmp, path, value, LanguageText{language});
 }
 
 }  // namespace ovrametadata

@@ -104,8 +104,13 @@ TEST_F(OvrametaTest, TheSamplePackageAddsItsSchemaViewAndDictionaries) {
                              "    Condition: Good\n", "  --\n"});
   const Result german = Run({"show", "--view", "PhotoArchive", "harbour.jpg"}, user + " LC_ALL=de_DE.UTF-8");
   ExpectContains(german.out, {"Fotoarchiv\n", "    Zustand: Gut\n"});
-  // Without the package its properties are unknown names.
-  EXPECT_EQ(Run({"get", "harbour.jpg", "photoArchive:Condition"}).status, 2);
+  // Without the package its values read as stored, and are not written.
+  const Result raw = Run({"get", "harbour.jpg", "photoArchive:Condition"});
+  EXPECT_EQ(raw.status, 0) << raw.err;
+  EXPECT_EQ(raw.out, "good\n");
+  const Result refused = Run({"set", "harbour.jpg", "photoArchive:Condition=poor"});
+  EXPECT_EQ(refused.status, 2);
+  ExpectContains(refused.err, {"can be read but not written"});
 }
 
 TEST_F(OvrametaTest, WrittenSchemasAndGeneratedViewsLoadAsCustomFilesAndPackages) {
@@ -388,9 +393,12 @@ TEST_F(OvrametaTest, FilesWorkedOnSideBySideGiveWhatOneThreadGives) {
 
 TEST_F(OvrametaTest, UsageErrorsExitWithTwo) {
   Sample("harbour.jpg");
-  const Result unknownPrefix = Run({"get", "harbour.jpg", "nope:title"});
+  const Result unknownPrefix = Run({"set", "harbour.jpg", "nope:title=x"});
   EXPECT_EQ(unknownPrefix.status, 2);
   ExpectContains(unknownPrefix.err, {"\"nope:title\": no schema is registered with the prefix \"nope\""});
+  const Result undeclared = Run({"get", "harbour.jpg", "nope:title"});
+  EXPECT_EQ(undeclared.status, 1);
+  ExpectContains(undeclared.err, {"nope:title: no value (no definition has the prefix \"nope\", nor does the file)"});
   const Result unknownProperty = Run({"get", "harbour.jpg", "dc:titel"});
   EXPECT_EQ(unknownProperty.status, 2);
   ExpectContains(unknownProperty.err, {"has no property \"titel\""});

@@ -26,6 +26,10 @@ const char kDefinitions[] = R"(<xmp_definitions>
     <xmp_property name="Caption" type="alt" element_type="text"/>
     <xmp_property name="When" type="date"/>
     <xmp_property name="Ratio" type="real"/>
+    <xmp_property name="Stars" type="closedchoice" element_type="real">
+      <xmp_choice raw_value="-1"/>
+      <xmp_choice raw_value="5"/>
+    </xmp_property>
     <xmp_property name="Exposure" type="rational" category="internal"/>
     <xmp_property name="Hidden" type="text" category="internal"/>
     <xmp_property name="Built" type="text" category="internal"/>
@@ -160,6 +164,7 @@ TEST_F(ValuesTest, TextNotFittingItsTypeIsDeliveredAndReported) {
   } rows[] = {
       {"Flag", "tRuE", true},   {"Flag", "0", true},      {"Flag", "yes", false}, {"Count", "42", true},
       {"Count", "007", false},  {"Count", "+7", false},   {"Mode", "manual", true}, {"Mode", "Manual", false},
+      {"Stars", "5.0", true},   {"Stars", "-1", true},    {"Stars", "4.5", false},
   };
   for (const auto& row : rows) {
     SCOPED_TRACE(std::string(row.property) + "=" + row.stored);
@@ -354,6 +359,58 @@ TEST_F(ValuesTest, NullPacketOrMissingDefinitionReadsAndWritesNothing) {
   undefined.description = "Title";
   EXPECT_FALSE(SetValue(Packet(), undefined, "changed"));
   EXPECT_TRUE(SetValue(Packet(), undefined, 5));
+}
+
+TEST_F(ValuesTest, OneLanguageOfAnAlternativeIsReadAndWrittenAlone) {
+  EXPECT_EQ(GetAltTextLanguages(Packet(), P("Caption")), (std::vector<UTF8String>{"x-default", "fr"}));
+  UTF8String text;
+  ASSERT_TRUE(GetAltTextValue(Packet(), P("Caption"), "FR", text));
+  EXPECT_EQ(text, "Légende");
+  EXPECT_FALSE(GetAltTextValue(Packet(), P("Caption"), "de", text));  // no fallback to x-default
+
+  EXPECT_TRUE(SetAltTextValue(Packet(), P("Caption"), "de-CH", "Legende"));
+  EXPECT_TRUE(SetAltTextValue(Packet(), P("Caption"), "fr", "Titre"));
+  EXPECT_FALSE(SetAltTextValue(Packet(), P("Caption"), "fr", "Titre"));  // unchanged
+  EXPECT_EQ(GetAltTextLanguages(Packet(), P("Caption")), (std::vector<UTF8String>{"x-default", "fr", "de-CH"}));
+  ASSERT_TRUE(GetAltTextValue(Packet(), P("Caption"), "x-default", text));
+  EXPECT_EQ(text, "Default caption");
+  // A new alternative starts with its default item.
+  mMeta.DeleteProperty(kNS, "Caption");
+  EXPECT_TRUE(SetAltTextValue(Packet(), P("Caption"), "it", "Didascalia"));
+  EXPECT_EQ(GetAltTextLanguages(Packet(), P("Caption")), (std::vector<UTF8String>{"x-default", "it"}));
+  ExpectReports("writing", {});
+
+  EXPECT_FALSE(SetAltTextValue(Packet(), P("Caption"), "not a tag", "x"));
+  EXPECT_FALSE(SetAltTextValue(Packet(), P("Title"), "fr", "x"));
+  ExpectReports("writing", {"Caption", "Title"});
+}
+
+TEST_F(ValuesTest, WhatAPacketStoresIsListedWithoutDefinitions) {
+  mMeta.ParseFromBuffer(R"(<x:xmpmeta xmlns:x="adobe:ns:meta/"><rdf:RDF xmlns:rdf="http://www.w3.org/1999/02/22-rdf-syntax-ns#">
+    <rdf:Description rdf:about="" xmlns:un="http://ns.ovra.test/undefined/" un:Simple="s">
+     <un:Area rdf:parseType="Resource"><un:x>0.5</un:x></un:Area>
+     <un:List><rdf:Seq><rdf:li>a</rdf:li><rdf:li>b</rdf:li></rdf:Seq></un:List>
+     <un:Caption><rdf:Alt><rdf:li xml:lang="x-default">Hi</rdf:li><rdf:li xml:lang="fr">Salut</rdf:li></rdf:Alt></un:Caption>
+    </rdf:Description></rdf:RDF></x:xmpmeta>)");
+  const auto namespaces = GetStoredNamespaces(Packet());
+  ASSERT_EQ(namespaces.size(), 1u);
+  EXPECT_EQ(namespaces[0].prefix, "un");
+  const auto nodes = GetStoredNodes(Packet(), namespaces[0].namespaceURI);
+  ASSERT_EQ(nodes.size(), 4u);
+  EXPECT_EQ(nodes[0].name, "un:Simple");
+  EXPECT_EQ(nodes[0].value, "s");
+  EXPECT_EQ(nodes[1].kind, StoredNode::kStruct);
+  ASSERT_EQ(nodes[1].children.size(), 1u);
+  EXPECT_EQ(nodes[1].children[0].name, "un:x");
+  EXPECT_EQ(nodes[1].children[0].value, "0.5");
+  EXPECT_EQ(nodes[2].kind, StoredNode::kArray);
+  ASSERT_EQ(nodes[2].children.size(), 2u);
+  EXPECT_EQ(nodes[2].children[1].name, "[2]");
+  EXPECT_EQ(nodes[2].children[1].value, "b");
+  ASSERT_EQ(nodes[3].children.size(), 2u);
+  EXPECT_EQ(nodes[3].children[1].language, "fr");
+  EXPECT_EQ(nodes[3].children[1].value, "Salut");
+  EXPECT_TRUE(GetStoredNodes(nullptr, namespaces[0].namespaceURI).empty());
 }
 
 }  // namespace

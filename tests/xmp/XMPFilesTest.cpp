@@ -254,6 +254,24 @@ TEST(XMPFiles, AReadShowsTheStoredPacketAndNativeValuesOnlyWhereItHasNone) {
   EXPECT_EQ(xmptest::media::ExifToolValue(path, "XMP-xmp:Label"), "Edited");
 }
 
+TEST(XMPFiles, TheToolkitsTextOnADamagedExifBlockWasPrintedBare) {
+  if (!xmptest::media::HaveExifTool()) GTEST_SKIP() << "ExifTool is missing; it makes the file";
+  ovratest::TempDir dir;
+  const std::string path = (dir / "damaged.jpg").string();
+  ovratest::WriteFile(path, xmptest::media::Jpeg());
+  xmptest::media::RunCommand("exiftool -q -overwrite_original -EXIF:Artist=Me -XMP-xmp:Label=Kept '" + path + "'");
+  std::string bytes = ovratest::ReadFile(path);
+  bytes.replace(bytes.find("Exif") + 6, 2, "XX");  // no TIFF byte order
+  ovratest::WriteFile(path, bytes);
+  testing::internal::CaptureStderr();
+  XMPFiles file(path, kXMP_UnknownFile, kRead);
+  XMPMeta meta;
+  EXPECT_TRUE(file.GetXMP(&meta));
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+  EXPECT_EQ(file.ToolkitNotes(), std::vector<std::string>{"Unrecognized TIFF prefix"});
+  EXPECT_EQ(xmptest::Get(meta, kXMP_NS_XMP, "Label"), "Kept");
+}
+
 TEST(XMPFiles, EditsGoIntoThePacketStoredAtWriteTimeAndOtherPacketsRemoveNothing) {
   ovratest::TempDir dir;
   const std::string path = (dir / "shared.jpg").string();

@@ -49,6 +49,23 @@ std::vector<std::string>& LibraryMessages() {
   return messages;
 }
 
+// The library names properties by namespace URI and name
+// ("http://ns.adobe.com/xap/1.0/Rating"); people know them as "xmp:Rating".
+std::string WithPrefixedNames(std::string message) {
+  static const std::vector<std::pair<std::string, std::string>> namespaces = [] {
+    std::vector<std::pair<std::string, std::string>> all;
+    for (const auto& schema : KnownSchemas()) all.emplace_back("\"" + schema->namespaceURI, "\"" + schema->prefix + ":");
+    // The longest first: one namespace URI may begin another.
+    std::sort(all.begin(), all.end(), [](const auto& a, const auto& b) { return a.first.size() > b.first.size(); });
+    return all;
+  }();
+  for (const auto& [uri, prefix] : namespaces) {
+    for (auto at = message.find(uri); at != std::string::npos; at = message.find(uri, at + prefix.size()))
+      message.replace(at, uri.size(), prefix);
+  }
+  return message;
+}
+
 class Reporter {
  public:
   explicit Reporter(Progress* progress = nullptr) : mProgress(progress) {}
@@ -70,11 +87,14 @@ class Reporter {
     mStatus = std::max(mStatus, status);
   }
 
-  // Relays what the library reported on this thread since the last call.
+  // Relays what the library reported on this thread since the last call,
+  // each report once.
   void FlushLibrary(const std::string& context) {
     auto& messages = LibraryMessages();
     for (const auto& message : messages) {
-      Emit("ovrameta: " + (context.empty() ? "" : context + ": ") + "warning: " + message + "\n");
+      const std::string line = "ovrameta: " + (context.empty() ? "" : context + ": ") + "warning: " +
+                               WithPrefixedNames(message) + "\n";
+      if (mRelayed.insert(line).second) Emit(line);
     }
     messages.clear();
   }
@@ -99,6 +119,7 @@ class Reporter {
   }
 
   Progress* mProgress;
+  std::set<std::string> mRelayed;
   int mStatus = kExitSuccess;
   bool mBuffered = false;
   std::string mBuffer;
@@ -253,6 +274,13 @@ std::string ShowText(const boost::shared_ptr<MetaDataProvider>& provider, const 
     out << schema.label << '\n';
     for (const auto& value : values) PrintNode(out, value, 1);
   }
+  {
+    MetaDataReadAccess reader(provider);
+    for (const UndefinedValues& undefined : ReadUndefinedValues(*reader)) {
+      out << undefined.prefix << " (" << undefined.namespaceURI << ", no definition)\n";
+      for (const auto& value : undefined.values) PrintNode(out, value, 1);
+    }
+  }
   text += out.str();
   return text.empty() ? "(no metadata)\n" : text;
 }
@@ -268,6 +296,10 @@ void PrintFlat(std::ostream& out, const std::string& prefix, const ValueNode& no
   }
   const std::string text = node.mixed ? "(mixed)" : raw && node.raw ? *node.raw : node.value;
   out << prefix << node.name << " = " << text << '\n';
+  for (const auto& language : node.languages) {
+    if (language.first != "x-default")
+      out << prefix << node.name << "[@" << language.first << "] = " << language.second << '\n';
+  }
 }
 
 Json NodeJson(const ValueNode& node, bool withSchema) {
@@ -285,6 +317,11 @@ Json NodeJson(const ValueNode& node, bool withSchema) {
     case ValueNode::kSimple:
       json["value"] = node.value;
       json["raw"] = node.raw ? Json(*node.raw) : Json(nullptr);
+      if (!node.languages.empty()) {
+        Json languages = Json::object();
+        for (const auto& language : node.languages) languages[language.first] = language.second;
+        json["languages"] = languages;
+      }
       break;
     case ValueNode::kStruct: {
       Json fields = Json::array();
@@ -304,6 +341,19 @@ Json NodeJson(const ValueNode& node, bool withSchema) {
     }
   }
   return json;
+}
+
+// One language of an alternative, as a simple value.
+bool ReadLanguage(XMPMetaRef xmp, const ResolvedName& name, const ReadOptions& options,
+                  ValueNode& node) {
+  UTF8String text;
+  if (!GetAltTextValue(xmp, name.path, name.language, text)) return false;
+  node.name = name.name;
+  node.label = name.label + " [" + name.language + "]";
+  if (options.types) node.typeText = "text";
+  node.value = node.read = text;
+  if (options.raw) node.raw = text;
+  return true;
 }
 
 // ---------------------------------------------------------------------------
@@ -450,10 +500,14 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
     std::string error;
     if (text.find('=') != std::string::npos) {
       reporter.Error("", Quoted(text) + ": get takes names, not assignments", kExitUsage);
-    } else if (!ResolveName(text, name, error)) {
-      reporter.Error("", error, kExitUsage);
-    } else {
+    } else if (ResolveName(text, name, error)) {
       names.push_back(name);
+    } else if (!SchemaForPrefix(text.substr(0, text.find(':')))) {
+      // No definition: looked up by the prefix each file declares.
+      name.name = name.label = text;
+      names.push_back(name);
+    } else {
+      reporter.Error("", error, kExitUsage);
     }
   }
   if (reporter.status() != kExitSuccess) return reporter.status();
@@ -488,21 +542,35 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
           for (const auto& schema : ReadAllValues(file.provider, readOptions)) {
             for (const auto& value : schema.values) properties.push_back(NodeJson(value, true));
           }
+          for (const auto& undefined : ReadUndefinedValues(*reader)) {
+            for (const auto& value : undefined.values) properties.push_back(NodeJson(value, true));
+          }
         }
         std::ostringstream text;
+        const bool anyUndefined =
+            std::any_of(names.begin(), names.end(), [](const ResolvedName& n) { return !n.entry; });
+        const auto namespaces = anyUndefined ? GetStoredNamespaces(*reader) : std::vector<StoredNamespace>();
         for (const auto& name : names) {
           ValueNode node;
-          const bool found = ReadValue(*reader, name.path, name.name, readOptions, node);
+          const bool found = !name.entry ? ReadUndefinedValue(*reader, name.name, node)
+                             : name.language.empty()
+                                 ? ReadValue(*reader, name.path, name.name, readOptions, node)
+                                 : ReadLanguage(*reader, name, readOptions, node);
           // A raw read of a value that is only constructed finds nothing stored.
           const bool stored = found && (!options.raw || node.raw || node.kind != ValueNode::kSimple);
           if (!stored) {
-            out.notes.Error(fileName, name.name + ": no " + (found ? "stored " : "") + "value",
+            const std::string prefix = name.name.substr(0, name.name.find(':'));
+            const bool declared = name.entry || std::any_of(namespaces.begin(), namespaces.end(),
+                                                            [&](const auto& ns) { return ns.prefix == prefix; });
+            out.notes.Error(fileName,
+                            name.name + ": no " + (found ? "stored " : "") + "value" +
+                                (declared ? "" : " (no definition has the prefix " + Quoted(prefix) + ", nor does the file)"),
                             kExitAbsent);
             if (options.json) {
               Json missing;
               missing["name"] = name.name;
               missing["label"] = name.label;
-              missing["type"] = TypeText(*name.entry);
+              missing["type"] = name.entry ? TypeText(*name.entry) : std::string();
               missing["value"] = nullptr;
               properties.push_back(missing);
             }
@@ -548,7 +616,8 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
 // The first array item named in name ("dc:subject[9]" in
 // "dc:subject[9]", "xmpDM:markers[2]" in "xmpDM:markers[2]/xmpDM:name")
 // that the packet does not hold; empty when every one exists.
-std::string MissingArrayItem(XMPMetaRef xmp, const std::string& name) {
+std::string MissingArrayItem(XMPMetaRef xmp, const std::string& fullName) {
+  const std::string name = WithoutLanguage(fullName, nullptr);
   for (std::size_t close = name.find(']'); close != std::string::npos; close = name.find(']', close + 1)) {
     ResolvedName item;
     std::string error;
@@ -601,6 +670,11 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
     std::string error;
     if (!ResolveName(text, name, error)) {
       reporter.Error("", error, kExitUsage);
+      continue;
+    }
+    if (!name.language.empty()) {
+      reporter.Error("", Quoted(text) + ": --delete removes a whole property, not one language",
+                     kExitUsage);
       continue;
     }
     deletions.push_back(name);
@@ -671,7 +745,11 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
       // The library reports a value it could not write, or that did not
       // read back as written; a value already there is not written again.
       const std::size_t reports = GetErrorInfos().size();
-      if (SetValue(xmp, assignment.name.path, assignment.value)) changes.push_back(assignment.name.path);
+      const auto& name = assignment.name;
+      const bool written = name.language.empty()
+                               ? SetValue(xmp, name.path, assignment.value)
+                               : SetAltTextValue(xmp, name.path, name.language, assignment.value);
+      if (written) changes.push_back(name.path);
       if (GetErrorInfos().size() != reports) {
         reporter.Error(context, assignment.name.name + ": the value could not be written", kExitUsage);
       }
@@ -703,7 +781,10 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
       opened.size(), Jobs(),
       [&](std::size_t i) {
         const std::string failure = opened[i].batched->Flush();
-        if (!failure.empty()) notes[i].Error(opened[i].name, "cannot write file: " + failure, kExitUsage);
+        // A format that is only read says so as it stands.
+        const bool readOnly = failure.rfind("can be read but not written", 0) == 0;
+        if (!failure.empty())
+          notes[i].Error(opened[i].name, (readOnly ? "" : "cannot write file: ") + failure, kExitUsage);
         notes[i].FlushLibrary(opened[i].name);
       },
       [&](std::size_t i) {

@@ -104,7 +104,15 @@ SchemaDefinitionPtr SchemaForPrefix(const std::string& prefix) {
   return SchemaDefinitionPtr();
 }
 
-bool LooksLikeName(const std::string& text) {
+std::string WithoutLanguage(const std::string& name, std::string* language) {
+  const auto open = name.rfind("[@");
+  if (open == std::string::npos || name.back() != ']') return name;
+  if (language) *language = name.substr(open + 2, name.size() - open - 3);
+  return name.substr(0, open);
+}
+
+bool LooksLikeName(const std::string& full) {
+  const std::string text = WithoutLanguage(full, nullptr);
   const auto colon = text.find(':');
   if (colon == std::string::npos || colon == 0) return false;
   if (text.substr(0, colon).find('/') != std::string::npos) return false;
@@ -146,7 +154,9 @@ Path FieldPath(const Path& path, const EntryDefinition& entry,
   }
 }
 
-bool ResolveName(const std::string& name, ResolvedName& out, std::string& error) {
+bool ResolveName(const std::string& fullName, ResolvedName& out, std::string& error) {
+  std::string language;
+  const std::string name = WithoutLanguage(fullName, &language);
   const auto segments = Split(name, '/');
   Segment first;
   if (!ParseSegment(segments.front(), first)) {
@@ -155,7 +165,8 @@ bool ResolveName(const std::string& name, ResolvedName& out, std::string& error)
   }
   const auto schema = SchemaForPrefix(first.prefix);
   if (!schema) {
-    error = Quoted(name) + ": no schema is registered with the prefix " + Quoted(first.prefix);
+    error = Quoted(name) + ": no schema is registered with the prefix " + Quoted(first.prefix) +
+            " (values without a definition can be read but not written; the README says how to add one)";
     return false;
   }
   const std::string schemaLabel = LabelOr(schema->label, schema->prefix);
@@ -224,7 +235,19 @@ bool ResolveName(const std::string& name, ResolvedName& out, std::string& error)
     walked += "/" + segment.prefix + ":" + segment.local;
     if (segment.index > 0 && !takeItem(segment.index)) return false;
   }
-  out.name = name;
+  if (name != fullName) {
+    const auto primitive = PrimitiveTypeOfPath(path);
+    if (!primitive || *primitive != kPrimitiveType_alt) {
+      error = Quoted(fullName) + ": " + walked + " is not a language alternative";
+      return false;
+    }
+    if (language.empty()) {
+      error = Quoted(fullName) + ": no language given (as in " + walked + "[@fr])";
+      return false;
+    }
+  }
+  out.name = fullName;
+  out.language = language;
   out.path = path;
   out.entry = entry;
   out.label = LabelOr(entry->label, entry->name);

@@ -19,6 +19,10 @@ std::vector<ovrametadata::SchemaDefinitionPtr> KnownSchemas();
 // The schema registered under prefix; null when there is none.
 ovrametadata::SchemaDefinitionPtr SchemaForPrefix(const std::string& prefix);
 
+// Splits "dc:title[@fr]" into "dc:title" and, when language is given, "fr";
+// other names come back whole.
+std::string WithoutLanguage(const std::string& name, std::string* language);
+
 // Whether text has the shape of a property name: a prefix (no "/" in it),
 // a colon and a local name. Says nothing about whether it is registered.
 bool LooksLikeName(const std::string& text);
@@ -28,10 +32,12 @@ struct ResolvedName {
   ovrametadata::Path path;
   boost::shared_ptr<ovrametadata::EntryDefinition> entry;
   std::string label;
+  std::string language;  // "fr" of "dc:title[@fr]": one language of an alternative
 };
 
 // Resolves "prefix:Property", "prefix:Struct/prefix:Field" (any depth) and
-// items "prefix:Array[2]" (1-based). On failure returns false and sets
+// items "prefix:Array[2]" (1-based), and one language of an alternative
+// "prefix:Alt[@fr]". On failure returns false and sets
 // error to a sentence naming the property.
 bool ResolveName(const std::string& name, ResolvedName& out, std::string& error);
 

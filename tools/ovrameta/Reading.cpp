@@ -1,5 +1,8 @@
 #include "Reading.h"
 
+#include <algorithm>
+#include <cctype>
+#include <charconv>
 #include <ostream>
 #include <set>
 
@@ -50,6 +53,18 @@ std::string DisplayText(const EntryDefinition& entry, const std::string& value) 
   for (const auto& choice : ChoicesOf(entry)) {
     if (choice && choice->rawValue == value) return LabelOr(choice->label, value);
   }
+  // A numeric choice written in another form ("5.0" for "5").
+  const auto number = [](const std::string& text) -> boost::optional<double> {
+    double parsed = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), parsed);
+    if (text.empty() || error != std::errc() || end != text.data() + text.size()) return boost::none;
+    return parsed;
+  };
+  const auto wanted = number(value);
+  if (!wanted) return value;
+  for (const auto& choice : ChoicesOf(entry)) {
+    if (choice && number(choice->rawValue) == wanted) return LabelOr(choice->label, value);
+  }
   return value;
 }
 
@@ -89,6 +104,15 @@ bool ReadConstructedValue(XMPMetaRef xmp, const Path& path, const std::string& n
   node.value = DisplayText(entry, constructed);
   out = std::move(node);
   return true;
+}
+
+void ReadLanguages(XMPMetaRef xmp, const Path& path, ValueNode& node) {
+  const auto languages = GetAltTextLanguages(xmp, path);
+  if (languages.empty() || (languages.size() == 1 && languages.front() == "x-default")) return;
+  for (const auto& language : languages) {
+    UTF8String text;
+    if (GetAltTextValue(xmp, path, language, text)) node.languages.emplace_back(language, text);
+  }
 }
 
 }  // namespace
@@ -164,6 +188,7 @@ bool ReadValue(XMPMetaRef xmp, const Path& path, const std::string& name,
   } else {
     node.read = text;
     node.value = DisplayText(*entry, text);
+    if (options.items && *primitive == kPrimitiveType_alt) ReadLanguages(xmp, path, node);
     // The library formats internal properties itself; dates and GPS
     // coordinates of editorial properties are formatted here. Their rationals
     // (a time scale of 1/1000) read better as stored than with two decimals.
@@ -242,6 +267,23 @@ void ListStored(AggregateProvider& presence, const std::string& namespaceURI, St
 
 }  // namespace
 
+namespace {
+ValueNode StoredValueNode(const StoredNode& stored, const std::string& name, const std::string& label);
+
+// The stored top-level properties of namespaceURI that its schema does not
+// define: shown as stored rather than left out.
+void AddUndefinedProperties(XMPMetaRef xmp, const SchemaRef& schema,
+                            const std::set<std::string, std::less<>>& names, SchemaValues& values) {
+  std::set<std::string, std::less<>> defined;
+  for (const auto& property : schema.properties) defined.insert(property.property->name);
+  if (std::all_of(names.begin(), names.end(), [&](const std::string& n) { return defined.count(n) != 0; })) return;
+  for (const StoredNode& stored : GetStoredNodes(xmp, schema.schema->namespaceURI)) {
+    if (!defined.count(stored.name.substr(stored.name.find(':') + 1)))
+      values.values.push_back(StoredValueNode(stored, stored.name, stored.name));
+  }
+}
+}  // namespace
+
 std::vector<SchemaValues> ReadAllValues(const boost::shared_ptr<MetaDataProvider>& provider,
                                         const ReadOptions& options) {
   std::vector<SchemaValues> all;
@@ -279,12 +321,130 @@ std::vector<SchemaValues> ReadAllValues(const boost::shared_ptr<MetaDataProvider
         values.values.push_back(std::move(node));
       }
     }
+    AddUndefinedProperties(xmp, schema, names, values);
     if (values.values.empty()) continue;
     values.schema = schema.schema;
     values.label = schema.label;
     all.push_back(std::move(values));
   }
   return all;
+}
+
+namespace {
+
+// Kept in memory only; never part of a file's metadata.
+const char kTransientNamespace[] = "http://ns.adobe.com/xmp/transient/1.0/";
+
+std::string JoinTexts(const std::vector<std::string>& texts) {
+  std::string joined;
+  for (const auto& text : texts) joined += (joined.empty() ? "" : "; ") + text;
+  return joined;
+}
+
+bool EqualsIgnoringCase(const std::string& a, const std::string& b) {
+  return a.size() == b.size() && std::equal(a.begin(), a.end(), b.begin(), [](char x, char y) {
+           return std::tolower(static_cast<unsigned char>(x)) == std::tolower(static_cast<unsigned char>(y));
+         });
+}
+
+// A node as stored, shown without a definition: an alternative of
+// languages reads as its default text with the others beside it.
+ValueNode StoredValueNode(const StoredNode& stored, const std::string& name, const std::string& label) {
+  ValueNode node;
+  node.name = name;
+  node.label = label;
+  const bool languages = stored.kind == StoredNode::kArray && !stored.children.empty() &&
+                         std::all_of(stored.children.begin(), stored.children.end(), [](const StoredNode& item) {
+                           return item.kind == StoredNode::kSimple && !item.language.empty();
+                         });
+  if (languages) {
+    node.typeText = "alt of text";
+    node.value = stored.children.front().value;
+    for (const StoredNode& item : stored.children) {
+      if (item.language == "x-default") node.value = item.value;
+      node.languages.emplace_back(item.language, item.value);
+    }
+  } else if (stored.kind == StoredNode::kSimple) {
+    node.typeText = "text";
+    node.value = stored.value;
+  } else {
+    node.kind = stored.kind == StoredNode::kArray ? ValueNode::kArray : ValueNode::kStruct;
+    node.typeText = node.kind == ValueNode::kArray ? "array" : "structure";
+    std::vector<std::string> texts;
+    for (const StoredNode& child : stored.children) {
+      const bool item = child.name.front() == '[';
+      node.children.push_back(StoredValueNode(child, name + (item ? "" : "/") + child.name, child.name));
+      if (item && child.kind == StoredNode::kSimple) texts.push_back(child.value);
+    }
+    if (node.kind == ValueNode::kArray && texts.size() == stored.children.size()) node.value = JoinTexts(texts);
+  }
+  node.read = node.value;
+  node.raw = node.value;
+  return node;
+}
+
+std::set<std::string> KnownNamespaces() {
+  std::set<std::string> known;
+  for (const auto& schema : KnownSchemas()) known.insert(schema->namespaceURI);
+  return known;
+}
+
+}  // namespace
+
+std::vector<UndefinedValues> ReadUndefinedValues(XMPMetaRef xmp) {
+  std::vector<UndefinedValues> all;
+  static const std::set<std::string> known = KnownNamespaces();
+  for (const StoredNamespace& ns : GetStoredNamespaces(xmp)) {
+    if (known.count(ns.namespaceURI) || ns.namespaceURI == kTransientNamespace) continue;
+    UndefinedValues values{ns.prefix, ns.namespaceURI, {}};
+    for (const StoredNode& stored : GetStoredNodes(xmp, ns.namespaceURI))
+      values.values.push_back(StoredValueNode(stored, stored.name, stored.name));
+    if (!values.values.empty()) all.push_back(std::move(values));
+  }
+  return all;
+}
+
+bool ReadUndefinedValue(XMPMetaRef xmp, const std::string& fullName, ValueNode& out) {
+  std::string language;
+  const std::string name = WithoutLanguage(fullName, &language);
+  const std::string prefix = name.substr(0, name.find(':'));
+  for (const StoredNamespace& ns : GetStoredNamespaces(xmp)) {
+    if (ns.prefix != prefix) continue;
+    const std::vector<StoredNode> top = GetStoredNodes(xmp, ns.namespaceURI);
+    // Walks "x:A[2]/y:B" step by step: names, then bracketed items.
+    const std::vector<StoredNode>* level = &top;
+    const StoredNode* found = nullptr;
+    std::size_t at = 0;
+    while (at < name.size()) {
+      std::size_t end = name.find_first_of("/[", at + 1);
+      if (end == std::string::npos) end = name.size();
+      if (name[at] == '[') end = name.find(']', at) + 1;
+      if (end == 0) return false;
+      const std::string step = name.substr(at, end - at);
+      const auto match = std::find_if(level->begin(), level->end(), [&](const StoredNode& n) { return n.name == step; });
+      if (match == level->end()) return false;
+      found = &*match;
+      level = &found->children;
+      at = end < name.size() && name[end] == '/' ? end + 1 : end;
+    }
+    if (!found) return false;
+    ValueNode node = StoredValueNode(*found, fullName, found->name);
+    if (!language.empty()) {
+      const auto text = std::find_if(node.languages.begin(), node.languages.end(),
+                                     [&](const auto& l) { return EqualsIgnoringCase(l.first, language); });
+      if (text == node.languages.end()) return false;
+      ValueNode one;
+      one.name = fullName;
+      one.label = found->name + " [" + text->first + "]";
+      one.typeText = "text";
+      one.value = one.read = text->second;
+      one.raw = text->second;
+      node = std::move(one);
+    }
+    out = std::move(node);
+    return true;
+  }
+  return false;
 }
 
 void PrintLines(std::ostream& out, const std::string& indent, const std::string& head,
@@ -311,6 +471,10 @@ void PrintNode(std::ostream& out, const ValueNode& node, int depth) {
   switch (node.kind) {
     case ValueNode::kSimple:
       PrintLines(out, indent, node.label + ": ", node.value);
+      for (const auto& language : node.languages) {
+        if (language.first != "x-default")
+          PrintLines(out, indent + "  ", "[" + language.first + "] ", language.second);
+      }
       break;
     case ValueNode::kStruct:
       out << indent << node.label << ":\n";

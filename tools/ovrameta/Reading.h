@@ -6,6 +6,7 @@
 #include <iosfwd>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include <boost/optional.hpp>
@@ -28,6 +29,9 @@ struct ValueNode {
   std::string read;       // the value as the library gave it, before choice labels
   boost::optional<std::string> raw;  // stored text, when asked for and stored
   std::vector<ValueNode> children;   // fields of a structure, items of an array
+  // Every language of a language alternative that holds more than the
+  // default one, as (tag, text) in stored order.
+  std::vector<std::pair<std::string, std::string>> languages;
 };
 
 // The paths a packet stores below one schema, written as Path::description
@@ -60,6 +64,19 @@ struct SchemaValues {
 // packet, in order.
 std::vector<SchemaValues> ReadAllValues(
     const boost::shared_ptr<ovrametadata::MetaDataProvider>& provider, const ReadOptions& options);
+
+// What the packet stores in namespaces that no known schema describes, each
+// under the prefix the packet declares, with raw values.
+struct UndefinedValues {
+  std::string prefix;
+  std::string namespaceURI;
+  std::vector<ValueNode> values;
+};
+std::vector<UndefinedValues> ReadUndefinedValues(XMPMetaRef xmp);
+
+// The value named name ("x:Prop", "x:Prop[2]/y:Field", "x:Alt[@fr]") in a
+// namespace without definition, found by the prefix the packet declares.
+bool ReadUndefinedValue(XMPMetaRef xmp, const std::string& name, ValueNode& out);
 
 // Prints head and text at indent; the continuation lines of a multi-line
 // text line up under its first line.

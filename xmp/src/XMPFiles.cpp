@@ -17,6 +17,7 @@
 
 #include <ovracore/SafeWrite.h>
 
+#include "ToolkitOutput.h"
 #include "XMPNodeTree.h"
 #include "XMPPacket.h"
 #include "files/Container.h"
@@ -86,6 +87,7 @@ struct XMPFiles::State {
   bool sidecar = false;
   std::string refusal;
   bool unreadable = false;  // the stored packet does not parse
+  std::vector<std::string> toolkitNotes;  // what the handler printed while reading
   mutable std::optional<XMP_FileFormat> format;
 
   // The file's layout and stored XMP; for an update, the original and
@@ -167,6 +169,8 @@ const std::string& XMPFiles::GetRefusal() const { return mState->refusal; }
 
 bool XMPFiles::PacketUnreadable() const { return mState->unreadable; }
 
+const std::vector<std::string>& XMPFiles::ToolkitNotes() const { return mState->toolkitNotes; }
+
 bool XMPFiles::GetFileInfo(std::string* filePath, XMP_OptionBits* openFlags, XMP_FileFormat* format) const {
   const State& s = *mState;
   if (!s.open) return false;
@@ -200,6 +204,7 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
   // packet the checks refuse is kept from the toolkit's handler as well.
   bool handlerMayRead = true;
   s.unreadable = false;
+  s.toolkitNotes.clear();
   try {
     shown = s.stored->TakeStored();
   } catch (const XMP_Error& e) {
@@ -212,22 +217,26 @@ bool XMPFiles::GetXMP(XMPMeta* xmpObj) {
   // the layout, does the toolkit's handler add anything.
   if (!s.sidecar && handlerMayRead && (s.container->HasNativeMetadata() || !s.container->KnowsLayout())) {
     // The handler's view: the stored packet merged with native metadata.
-    const detail::FileHandle file(xmp_files_open_new(s.target.c_str(), XMP_OPEN_READ));
-    if (file) {
-      XmpPtr merged = xmp_files_get_new_xmp(file.get());
-      if (merged) {
-        const XMPMeta view = detail::OwnPacket(merged);
-        std::set<std::pair<std::string, std::string>> stored;
-        for (detail::Key& key : detail::Properties(shown)) stored.emplace(std::move(key.ns), std::move(key.name));
-        for (const detail::Key& key : detail::Properties(view)) {
-          if (stored.count({key.ns, key.name})) continue;
-          detail::Node node;
-          if (!detail::ReadNode(view, key.ns, key.name, &node) || IsEmptyDerivedValue(node.value, node.options)) continue;
-          detail::WriteNode(shown, key.ns, key.name, node);
-          any = true;
+    const detail::ToolkitOutput output;
+    {
+      const detail::FileHandle file(xmp_files_open_new(s.target.c_str(), XMP_OPEN_READ));
+      if (file) {
+        XmpPtr merged = xmp_files_get_new_xmp(file.get());
+        if (merged) {
+          const XMPMeta view = detail::OwnPacket(merged);
+          std::set<std::pair<std::string, std::string>> stored;
+          for (detail::Key& key : detail::Properties(shown)) stored.emplace(std::move(key.ns), std::move(key.name));
+          for (const detail::Key& key : detail::Properties(view)) {
+            if (stored.count({key.ns, key.name})) continue;
+            detail::Node node;
+            if (!detail::ReadNode(view, key.ns, key.name, &node) || IsEmptyDerivedValue(node.value, node.options)) continue;
+            detail::WriteNode(shown, key.ns, key.name, node);
+            any = true;
+          }
         }
       }
     }
+    s.toolkitNotes = output.Lines();
   }
   if (!any) return false;
   XMPPacket& packet = detail::Require(xmpObj->GetInternalRef());

@@ -7,6 +7,7 @@
 #include <ovraxmp/XMPFiles.h>
 #include <ovraxmp/XMPMeta.h>
 
+#include "ToolkitOutput.h"
 #include "XMPPacket.h"
 
 namespace ovraxmp {
@@ -25,6 +26,7 @@ void* sAssertRefCon = nullptr;
 void StartLocked() {
   if (sToolkitUp.load(std::memory_order_acquire)) return;
   if (!xmp_init()) detail::Throw(kXMPErr_InternalFailure, "starting the XMP toolkit");
+  detail::StartCollectingToolkitOutput();
   // The transient namespace carries aggregate bookkeeping; it must be known
   // before anything is written into it.
   detail::XmpString registered;
@@ -71,6 +73,7 @@ void XMPMeta::Terminate() {
   if (sInitializationCount == 0) return;
   if (--sInitializationCount == 0 && sToolkitUp.load(std::memory_order_acquire)) {
     xmp_terminate();
+    detail::StopCollectingToolkitOutput();
     detail::ForgetNamespaces();
     sToolkitUp.store(false, std::memory_order_release);
   }

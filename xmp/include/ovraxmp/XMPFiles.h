@@ -74,6 +74,9 @@ class XMPFiles {
   // After GetXMP: whether the file holds an XMP packet that does not parse
   // (GetXMP then gives only the metadata outside it).
   bool PacketUnreadable() const;
+  // After GetXMP: what the toolkit said while it read the metadata outside
+  // the packet (a damaged EXIF block, for instance), one line each.
+  const std::vector<std::string>& ToolkitNotes() const;
 
   // ---- Process-wide ----
   // Counted start of the file part (it also holds a start of the core).

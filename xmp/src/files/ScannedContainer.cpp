@@ -1,6 +1,7 @@
 // Any other file: packets are found by their markers. Each is checked,
-// since the toolkit's handler may parse any of them; one wrapped packet that
-// allows writing (end="w") can be written in place, at its own length.
+// since the toolkit's handler may parse any of them. Such files are only
+// read: without knowing the format, a write could not tell a packet that
+// describes the file from one quoted inside it.
 #include <algorithm>
 #include <cstring>
 #include <iterator>
@@ -33,10 +34,15 @@ class ScannedContainer : public Container {
   const char* Name() const override { return "file"; }
   bool KnowsLayout() const override { return false; }
 
+  bool PlanWrite(const FileReader&, const std::string&, WritePlan*, std::string* problem) const override {
+    if (problem) *problem = "can be read but not written (" + mFormat + ")";
+    return false;
+  }
+
   bool Walk(const FileReader& file, std::string* problem) override {
     mNative = true;  // unknown: the toolkit's handler decides what there is
+    mFormat = FormatOf(file.ReadText(0, std::min<std::uint64_t>(file.Size(), 512)));
     std::uint32_t packets = 0;
-    std::uint32_t writable = 0;
     std::string piece;
     std::uint64_t pos = 0;
     // A start marker with no end behind it means no later one of its kind
@@ -66,10 +72,6 @@ class ScannedContainer : public Container {
         const std::string text = file.ReadText(extent->offset, extent->length);
         std::string why;
         if (!ScanPacket(text, &why)) return Refuse(problem, "XMP packet at byte " + std::to_string(start) + ": " + why);
-        const std::string ending = text.substr(text.size() > 32 ? text.size() - 32 : 0);
-        if (marker == &kMarkers[0] && (ending.find("end=\"w\"") != std::string::npos ||
-                                       ending.find("end='w'") != std::string::npos))
-          ++writable;
         if (marker == &kMarkers[0] && !mPacket) mPacket = extent;
         if (extent->End() >= pos + n) {
           next = extent->End();
@@ -79,12 +81,29 @@ class ScannedContainer : public Container {
       }
       pos = std::max(next, pos + 1);
     }
-    // Only a file with one packet, open for writing, is written in place.
-    if (packets != 1 || writable != 1) mPacket.reset();
+    // With several packets, which one describes the file is the toolkit's
+    // handler's to say.
+    if (packets != 1) mPacket.reset();
     return true;
   }
 
  private:
+  // What people call the format, from the first bytes.
+  static std::string FormatOf(const std::string& head) {
+    const auto starts = [&](const char* magic, std::size_t length) { return head.compare(0, length, magic, length) == 0; };
+    if (starts("%!PS", 4) || starts("\xC5\xD0\xD3\xC6", 4)) return "PostScript";
+    if (starts("%PDF", 4)) return "PDF";
+    if (starts("AT&TFORM", 8)) return "DjVu";
+    if (starts("FLIF", 4)) return "FLIF";
+    if (starts("\xFF\x0A", 2) || starts("\0\0\0\x0CJXL ", 8)) return "JPEG XL";
+    if (head.compare(6, 8, "HEAPCCDR") == 0) return "CRW";
+    if (starts("\x06\x06\xED\xF5\xD8\x1D\x46\xE5", 8)) return "InDesign";
+    if (head.find("<svg") != std::string::npos) return "SVG";
+    if (head.find("<?xml") != std::string::npos || head.find("<x:xmpmeta") != std::string::npos) return "XML";
+    return "unknown format";
+  }
+
+  std::string mFormat;
   // The packet from its start marker to the end of its end marker.
   static std::optional<Extent> PacketAt(const FileReader& file, std::uint64_t start, const Marker& marker) {
     std::string piece;
