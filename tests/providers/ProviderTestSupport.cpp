@@ -6,7 +6,7 @@
 
 #include <ovrametadata/Definitions.h>
 
-#include "MediaFiles.h"
+#include "../xmp/XMPMediaFiles.h"
 
 namespace ovratest {
 
@@ -136,10 +136,17 @@ void RecordingBufferProvider::WriteBuffer(const std::vector<Path>& changes, cons
   writes.push_back(Write{changes, std::string(data, length)});
 }
 
-void Edit(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path,
+bool Edit(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path,
           const std::string& value) {
   MetaDataUpdateAccess access(provider);
-  if (SetValue(*access, path, UTF8String(value))) access.AddChange(path);
+  if (!SetValue(*access, path, UTF8String(value))) return false;
+  access.AddChange(path);
+  return true;
+}
+
+void Touch(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path) {
+  MetaDataUpdateAccess access(provider);
+  access.AddChange(path);
 }
 
 std::string WrittenRaw(const RecordingBufferProvider::Write& write, const std::string& ns,
@@ -172,9 +179,9 @@ std::string MediaExtension(MediaKind kind) {
 
 std::string MediaBytes(MediaKind kind) {
   switch (kind) {
-    case MediaKind::JPEG: return media::MinimalJPEG();
-    case MediaKind::MP4: return media::MinimalMP4();
-    case MediaKind::WAV: return media::MinimalWAV();
+    case MediaKind::JPEG: return xmptest::media::Jpeg();
+    case MediaKind::MP4: return xmptest::media::Mp4();
+    case MediaKind::WAV: return xmptest::media::Wav();
   }
   return "";
 }
