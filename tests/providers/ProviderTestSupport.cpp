@@ -168,24 +168,6 @@ CallCounter::CallCounter()
 
 // ---------------------------------------------------------------------------
 
-std::string MediaExtension(MediaKind kind) {
-  switch (kind) {
-    case MediaKind::JPEG: return ".jpg";
-    case MediaKind::MP4: return ".mp4";
-    case MediaKind::WAV: return ".wav";
-  }
-  return "";
-}
-
-std::string MediaBytes(MediaKind kind) {
-  switch (kind) {
-    case MediaKind::JPEG: return xmptest::media::Jpeg();
-    case MediaKind::MP4: return xmptest::media::Mp4();
-    case MediaKind::WAV: return xmptest::media::Wav();
-  }
-  return "";
-}
-
 void PutXMPIntoFile(const fs::path& file, const ovraxmp::XMPMeta& packet) {
   ovraxmp::XMPFiles handler(file.string(), ovraxmp::kXMP_UnknownFile,
                             ovraxmp::kXMPFiles_OpenForUpdate);
@@ -195,8 +177,9 @@ void PutXMPIntoFile(const fs::path& file, const ovraxmp::XMPMeta& packet) {
 
 fs::path MakeMediaFile(const fs::path& folder, const std::string& stem, MediaKind kind,
                        const std::string& properties) {
-  const fs::path file = folder / (stem + MediaExtension(kind));
-  WriteFile(file, MediaBytes(kind));
+  const bool jpeg = kind == MediaKind::JPEG, mp4 = kind == MediaKind::MP4;
+  const fs::path file = folder / (stem + (jpeg ? ".jpg" : mp4 ? ".mp4" : ".wav"));
+  WriteFile(file, jpeg ? xmptest::media::Jpeg() : mp4 ? xmptest::media::Mp4() : xmptest::media::Wav());
   if (!properties.empty()) PutXMPIntoFile(file, Packet(properties));
   return file;
 }

@@ -94,8 +94,6 @@ struct CallCounter {
 
 // ---- Media files ----
 enum class MediaKind { JPEG, MP4, WAV };
-std::string MediaExtension(MediaKind kind);
-std::string MediaBytes(MediaKind kind);
 // Writes a fresh media file; with properties non-empty, also embeds a packet
 // with them (through the toolkit, so no provider is involved).
 std::filesystem::path MakeMediaFile(const std::filesystem::path& folder, const std::string& stem,
