@@ -13,6 +13,7 @@
 #include <ovracore/FileSupport.h>
 #include <ovracore/SafeWrite.h>
 
+#include "../xmp/XMPMediaFiles.h"
 #include "TestSupport.h"
 
 using namespace ovracore;
@@ -37,16 +38,6 @@ std::string Replace(const fs::path& file, const std::string& text) {
       replacement.Append(text, &problem) && replacement.Commit(&problem))
     return std::string();
   return problem;
-}
-
-std::string Command(const std::string& command) {
-  std::string output;
-  if (FILE* pipe = ::popen((command + " 2>/dev/null").c_str(), "r")) {
-    char buffer[512];
-    while (std::fgets(buffer, sizeof buffer, pipe)) output += buffer;
-    ::pclose(pipe);
-  }
-  return output;
 }
 
 }  // namespace
@@ -232,14 +223,14 @@ TEST(FileReplacement, ExtendedAttributesAndAccessListsAreKept) {
   ovratest::WriteFile(file, "old");
   if (::setxattr(file.c_str(), "user.ovra.note", "kept", 4, 0) != 0) GTEST_SKIP() << "no user attributes here";
   const bool acl = std::system(("setfacl -m u:4321:r " + file.string() + " 2>/dev/null").c_str()) == 0;
-  const std::string before = Command("getfacl -cp " + file.string());
+  const std::string before = xmptest::media::RunCommand("getfacl -cp " + file.string() + " 2>/dev/null");
   const auto mode = fs::status(file).permissions();
   EXPECT_EQ(Replace(file, "new"), "");
   char value[16] = {};
   EXPECT_EQ(::getxattr(file.c_str(), "user.ovra.note", value, sizeof value), 4);
   EXPECT_STREQ(value, "kept");
   if (acl) {
-    EXPECT_EQ(Command("getfacl -cp " + file.string()), before);
+    EXPECT_EQ(xmptest::media::RunCommand("getfacl -cp " + file.string() + " 2>/dev/null"), before);
   }
   EXPECT_EQ(fs::status(file).permissions(), mode);
 }

@@ -18,23 +18,18 @@ void ExpectFormats(Formatter format, const std::vector<std::pair<const char*, co
   for (const auto& [raw, expected] : cases) EXPECT_EQ(format(nullptr, Path(), raw), expected) << "raw " << raw;
 }
 
-TEST(ExposureTime, StandardSpeedsWithinTwoPercentSnap) {
-  ExpectFormats(FormatExifExposureTime,
-                {{"1/250", "1/250 sec"}, {"1/247", "1/250 sec"}, {"1/8000", "1/8000 sec"},
-                 {"1/16000", "1/16000 sec"}, {"15/10", "1.5 sec"}, {"30/1", "30.0 sec"}, {"3/10", "0.3 sec"},
-                 // 1/4 is the last speed shown as a fraction.
-                 {"1/4", "1/4 sec"}, {"4/10", "0.4 sec"}});
-}
-
-TEST(ExposureTime, PowersOfTwoSnapInTheSecondPass) {
-  // More than 2 % from every standard speed; from 1/100 to 1/10 the
-  // correction is 16/15 instead of 1.024.
-  ExpectFormats(FormatExifExposureTime, {{"1/256", "1/250 sec"}, {"1/1024", "1/1000 sec"}, {"1/8192", "1/8000 sec"},
-                                         {"1/64", "1/60 sec"}, {"1/32", "1/30 sec"}});
-}
-
-TEST(ExposureTime, UnmatchedTimesAreRoundedByRange) {
-  ExpectFormats(FormatExifExposureTime, {{"40/1", "40.0 sec"},        // whole seconds from 10 s
+TEST(ExposureTime, SnapsToStandardSpeedsOrIsRoundedByRange) {
+  ExpectFormats(FormatExifExposureTime, {{"1/250", "1/250 sec"}, {"1/247", "1/250 sec"}, {"1/8000", "1/8000 sec"},
+                                         {"1/16000", "1/16000 sec"}, {"15/10", "1.5 sec"}, {"30/1", "30.0 sec"},
+                                         {"3/10", "0.3 sec"},
+                                         // 1/4 is the last speed shown as a fraction.
+                                         {"1/4", "1/4 sec"}, {"4/10", "0.4 sec"},
+                                         // Powers of two snap in the second pass: more than 2 % from every
+                                         // standard speed; from 1/100 to 1/10 the correction is 16/15.
+                                         {"1/256", "1/250 sec"}, {"1/1024", "1/1000 sec"}, {"1/8192", "1/8000 sec"},
+                                         {"1/64", "1/60 sec"}, {"1/32", "1/30 sec"},
+                                         // Unmatched times are rounded by range.
+                                         {"40/1", "40.0 sec"},        // whole seconds from 10 s
                                          {"726/100", "7.3 sec"},      // tenths from 0.5 s
                                          {"35/100", "0.3 sec"},       // step 1 gives 1/3, shown as decimal
                                          {"7/100", "1/14 sec"},       // step 1
@@ -42,13 +37,10 @@ TEST(ExposureTime, UnmatchedTimesAreRoundedByRange) {
                                          {"1/700", "1/700 sec"},      // step 0.1
                                          {"1/1110", "1/1100 sec"},    // step 0.02
                                          {"1/14060", "1/14100 sec"},  // step 0.01
-                                         {"1/20600", "1/21000 sec"}});  // step 0.001
-}
-
-TEST(ExposureTime, OverflowAndNonPositiveTimes) {
-  // No special case below zero: the reciprocal of the unsnapped 0 shows.
-  ExpectFormats(FormatExifExposureTime, {{"2000/1", ">1024 sec"}, {"1024/1", "1024.0 sec"}, {"0/1", "1/inf sec"},
-                                         {"-1/30", "1/inf sec"}, {"garbage", "1/inf sec"}});
+                                         {"1/20600", "1/21000 sec"},  // step 0.001
+                                         {"2000/1", ">1024 sec"}, {"1024/1", "1024.0 sec"},
+                                         // No special case below zero: the reciprocal of the unsnapped 0.
+                                         {"0/1", "1/inf sec"}, {"-1/30", "1/inf sec"}, {"garbage", "1/inf sec"}});
 }
 
 TEST(ExposureTime, UnitWordIsLocalised) {

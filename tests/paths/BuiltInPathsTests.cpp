@@ -1,5 +1,6 @@
 // Path resolution over the built-in structures and arrays (the real-world
-// property table of the built-in definitions tests covers simple paths).
+// property table of the built-in definitions tests covers simple paths and
+// the fields of structures).
 #include "MetadataTestSupport.h"
 
 namespace ovrametadata {
@@ -8,7 +9,6 @@ namespace {
 using ovratest::Descriptions;
 
 const char kDC[] = "http://purl.org/dc/elements/1.1/";
-const char kIptcCore[] = "http://iptc.org/std/Iptc4xmpCore/1.0/xmlns/";
 const char kDM[] = "http://ns.adobe.com/xmp/1.0/DynamicMedia/";
 
 class BuiltInPathsTest : public ::testing::Test {
@@ -27,29 +27,6 @@ TEST_F(BuiltInPathsTest, ArrayItemsOfBuiltInArrays) {
   // Alternatives have no items of their own here: their element is a
   // container value, not an array element.
   EXPECT_FALSE(IsPathAnArray(P(kDC, "title"), true));
-}
-
-TEST_F(BuiltInPathsTest, ContactInfoChildrenAreItsFields) {
-  const auto children = ChildPaths(P(kIptcCore, "CreatorContactInfo"));
-  EXPECT_EQ(Descriptions(children),
-            (std::vector<std::string>{
-                "CreatorContactInfo/Iptc4xmpCore:CiAdrExtadr", "CreatorContactInfo/Iptc4xmpCore:CiAdrCity",
-                "CreatorContactInfo/Iptc4xmpCore:CiAdrRegion", "CreatorContactInfo/Iptc4xmpCore:CiAdrPcode",
-                "CreatorContactInfo/Iptc4xmpCore:CiAdrCtry", "CreatorContactInfo/Iptc4xmpCore:CiTelWork",
-                "CreatorContactInfo/Iptc4xmpCore:CiEmailWork", "CreatorContactInfo/Iptc4xmpCore:CiUrlWork"}));
-  for (const Path& child : children) {
-    EXPECT_EQ(child.parent_id, "ContactInfo");
-    EXPECT_EQ(PrimitiveTypeOfPath(child), kPrimitiveType_text) << child.description;
-  }
-}
-
-TEST_F(BuiltInPathsTest, DurationIsATimeStructure) {
-  const auto range = ChildPaths(P(kDM, "duration"));
-  const std::vector<Path> children(range.begin(), range.end());
-  ASSERT_EQ(Descriptions(children), (std::vector<std::string>{"duration/xmpDM:value", "duration/xmpDM:scale"}));
-  EXPECT_EQ(PrimitiveTypeOfPath(children[0]), kPrimitiveType_integer);
-  EXPECT_EQ(*PathEntryDefinition(children[1])->type, "rational");
-  EXPECT_TRUE(children[1].internal);  // from xmpDM:duration
 }
 
 TEST_F(BuiltInPathsTest, MarkersAreAPlainValueUnlessInternal) {

@@ -86,11 +86,7 @@ TEST_F(AggregateOverFiles, ReadsEqualValuesAndMarksDifferingOrMissingOnesMixed) 
 }
 
 TEST_F(AggregateOverFiles, AnEditReachesEveryFileAndMixedValuesStayPerFile) {
-  {
-    MetaDataUpdateAccess access(aggregate);
-    ASSERT_TRUE(SetValue(*access, title, UTF8String("renamed")));
-    access.AddChange(title);
-  }
+  ASSERT_TRUE(ovratest::Edit(aggregate, title, "renamed"));
   for (std::size_t i = 0; i < files.size(); ++i) {
     EXPECT_EQ(FileText(i, title), "renamed") << files[i];
   }
@@ -101,11 +97,7 @@ TEST_F(AggregateOverFiles, AnEditReachesEveryFileAndMixedValuesStayPerFile) {
 }
 
 TEST_F(AggregateOverFiles, AClearedValueDeletesThePropertyEverywhere) {
-  {
-    MetaDataUpdateAccess access(aggregate);
-    ASSERT_TRUE(SetValue(*access, title, UTF8String("")));
-    access.AddChange(title);
-  }
+  ASSERT_TRUE(ovratest::Edit(aggregate, title, ""));
   for (std::size_t i = 0; i < files.size(); ++i) EXPECT_FALSE(FileHas(i, title)) << files[i];
   EXPECT_EQ(FileText(1, note), "b");
 }
@@ -131,11 +123,7 @@ TEST_F(AggregateOverFiles, AMemberThatRefusesAPathIsLeftUntouched) {
   auto refusing = boost::make_shared<RefusingFileProvider>(ovratest::U16Path(refusingFile));
   aggregate->AddProvider(refusing, true);
   EXPECT_TRUE(aggregate->QueryPathStatus(title, kPathStatusWritable));
-  {
-    MetaDataUpdateAccess access(aggregate);
-    ASSERT_TRUE(SetValue(*access, title, UTF8String("renamed")));
-    access.AddChange(title);
-  }
+  ASSERT_TRUE(ovratest::Edit(aggregate, title, "renamed"));
   EXPECT_EQ(ovratest::ReadFile(refusingFile), before);
   EXPECT_EQ(FileText(0, title), "renamed");
   EXPECT_EQ(FileText(2, title), "renamed");
@@ -167,11 +155,7 @@ TEST(AggregateProvider, OneMemberSharesItsPacketAndWritesThroughOneGuard) {
   auto aggregate = boost::make_shared<AggregateProvider>();
   aggregate->AddProvider(member, true);
   EXPECT_EQ(aggregate->MetaDataAccess(), member->MetaDataAccess());
-  {
-    MetaDataUpdateAccess access(aggregate);
-    ASSERT_TRUE(SetValue(*access, ovratest::TestPath("Title"), UTF8String("edited")));
-    access.AddChange(ovratest::TestPath("Title"));
-  }
+  ASSERT_TRUE(ovratest::Edit(aggregate, ovratest::TestPath("Title"), "edited"));
   ASSERT_EQ(member->writes.size(), 1u);
   ASSERT_EQ(member->writes[0].changes.size(), 1u);
   EXPECT_EQ(ovratest::Text(member->MetaDataAccess(), ovratest::TestPath("Title")), "edited");
@@ -222,11 +206,7 @@ TEST(AggregateProvider, WriteBackSkipsMembersWithoutMetadata) {
   auto none = boost::make_shared<RecordingBufferProvider>("garbage");
   auto b = RecordingBufferProvider::FromProperties("<pt:Title>A</pt:Title>");
   auto aggregate = boost::make_shared<AggregateProvider>(AsRange({a, none, b}));
-  {
-    MetaDataUpdateAccess access(aggregate);
-    ASSERT_TRUE(SetValue(*access, ovratest::TestPath("Title"), UTF8String("Z")));
-    access.AddChange(ovratest::TestPath("Title"));
-  }
+  ASSERT_TRUE(ovratest::Edit(aggregate, ovratest::TestPath("Title"), "Z"));
   EXPECT_EQ(a->writes.size(), 1u);
   EXPECT_EQ(b->writes.size(), 1u);
   EXPECT_TRUE(none->writes.empty());

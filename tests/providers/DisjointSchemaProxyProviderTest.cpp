@@ -32,11 +32,7 @@ class DisjointProxy : public ::testing::Test {
     proxy->RegisterProvider(otherSchema, routed);
   }
 
-  void Edit(const Path& path, const std::string& value) {
-    MetaDataUpdateAccess access(proxy);
-    ASSERT_TRUE(SetValue(*access, path, UTF8String(value)));
-    access.AddChange(path);
-  }
+  void Edit(const Path& path, const std::string& value) { ASSERT_TRUE(ovratest::Edit(proxy, path, value)); }
 
   boost::shared_ptr<RecordingBufferProvider> base, routed;
   boost::shared_ptr<SchemaDefinition> otherSchema;

@@ -12,7 +12,6 @@
 #include <ovrametadata/Providers.h>
 #include <ovrametadata/Values.h>
 
-#include "MediaFiles.h"
 #include "ProviderTestSupport.h"
 #include "TestSupport.h"
 
@@ -116,10 +115,7 @@ TEST(FileProvider, FileWithoutXMPGivesNullMetadataAndIsNeverWritten) {
   const std::string before = ovratest::ReadFile(file);
   auto provider = ovratest::OpenFile(file);
   EXPECT_EQ(provider->MetaDataAccess(), nullptr);
-  {
-    MetaDataUpdateAccess access(provider);
-    access.AddChange(ovratest::TestPath("Title"));
-  }
+  ovratest::Touch(provider, ovratest::TestPath("Title"));
   EXPECT_EQ(ovratest::ReadFile(file), before);
 }
 

@@ -114,10 +114,7 @@ TEST(UpdateGuard, RecordsOneHistoryPartPerChangedPath) {
 
 TEST(UpdateGuard, ProviderWritingItsOwnChangeListGetsNoHistory) {
   auto provider = boost::make_shared<SelfRecordingProvider>();
-  {
-    MetaDataUpdateAccess access(provider);
-    access.AddChange(ovratest::TestPath("Title"));
-  }
+  ovratest::Touch(provider, ovratest::TestPath("Title"));
   ASSERT_EQ(provider->writes.size(), 1u);
   EXPECT_EQ(provider->writes[0].bytes.find("History"), std::string::npos);
 }
@@ -264,10 +261,7 @@ TEST(Notifications, OwnWriteBackThatReplacesThePacketAnnouncesNothing) {
     nested.AddChange(ovratest::TestPath("Note"));
     ++nestedWrites;
   };
-  {
-    MetaDataUpdateAccess access(provider);
-    access.AddChange(ovratest::TestPath("Title"));
-  }
+  ovratest::Touch(provider, ovratest::TestPath("Title"));
   raw->duringWrite = nullptr;
   EXPECT_EQ(nestedWrites, 1);
   EXPECT_EQ(provider->writes.size(), 1u);

@@ -6,7 +6,7 @@
 
 #include <ovrametadata/Definitions.h>
 
-#include "MediaFiles.h"
+#include "../xmp/XMPMediaFiles.h"
 
 namespace ovratest {
 
@@ -136,10 +136,17 @@ void RecordingBufferProvider::WriteBuffer(const std::vector<Path>& changes, cons
   writes.push_back(Write{changes, std::string(data, length)});
 }
 
-void Edit(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path,
+bool Edit(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path,
           const std::string& value) {
   MetaDataUpdateAccess access(provider);
-  if (SetValue(*access, path, UTF8String(value))) access.AddChange(path);
+  if (!SetValue(*access, path, UTF8String(value))) return false;
+  access.AddChange(path);
+  return true;
+}
+
+void Touch(const boost::shared_ptr<MetaDataProvider>& provider, const Path& path) {
+  MetaDataUpdateAccess access(provider);
+  access.AddChange(path);
 }
 
 std::string WrittenRaw(const RecordingBufferProvider::Write& write, const std::string& ns,
@@ -161,24 +168,6 @@ CallCounter::CallCounter()
 
 // ---------------------------------------------------------------------------
 
-std::string MediaExtension(MediaKind kind) {
-  switch (kind) {
-    case MediaKind::JPEG: return ".jpg";
-    case MediaKind::MP4: return ".mp4";
-    case MediaKind::WAV: return ".wav";
-  }
-  return "";
-}
-
-std::string MediaBytes(MediaKind kind) {
-  switch (kind) {
-    case MediaKind::JPEG: return media::MinimalJPEG();
-    case MediaKind::MP4: return media::MinimalMP4();
-    case MediaKind::WAV: return media::MinimalWAV();
-  }
-  return "";
-}
-
 void PutXMPIntoFile(const fs::path& file, const ovraxmp::XMPMeta& packet) {
   ovraxmp::XMPFiles handler(file.string(), ovraxmp::kXMP_UnknownFile,
                             ovraxmp::kXMPFiles_OpenForUpdate);
@@ -188,8 +177,9 @@ void PutXMPIntoFile(const fs::path& file, const ovraxmp::XMPMeta& packet) {
 
 fs::path MakeMediaFile(const fs::path& folder, const std::string& stem, MediaKind kind,
                        const std::string& properties) {
-  const fs::path file = folder / (stem + MediaExtension(kind));
-  WriteFile(file, MediaBytes(kind));
+  const bool jpeg = kind == MediaKind::JPEG, mp4 = kind == MediaKind::MP4;
+  const fs::path file = folder / (stem + (jpeg ? ".jpg" : mp4 ? ".mp4" : ".wav"));
+  WriteFile(file, jpeg ? xmptest::media::Jpeg() : mp4 ? xmptest::media::Mp4() : xmptest::media::Wav());
   if (!properties.empty()) PutXMPIntoFile(file, Packet(properties));
   return file;
 }

@@ -17,6 +17,7 @@
 #include <ovrametadata/Providers.h>
 #include <ovrametadata/Values.h>
 
+#include "MetadataTestSupport.h"
 #include "TestSupport.h"
 
 namespace ovratest {
@@ -46,21 +47,6 @@ ovrametadata::GetValueResult ResultOf(XMPMetaRef xmp, const ovrametadata::Path& 
 // "<absent>" when it is not there.
 std::string Raw(XMPMetaRef xmp, const std::string& ns, const std::string& name);
 
-// The errors reported after construction.
-class ErrorsSince {
- public:
-  ErrorsSince() : mStart(ovrametadata::GetErrorInfos().size()) {}
-  std::vector<ovrametadata::ErrorInfo> New() const {
-    const std::vector<ovrametadata::ErrorInfo> all = ovrametadata::GetErrorInfos();
-    if (all.size() < mStart) return all;
-    return std::vector<ovrametadata::ErrorInfo>(all.begin() + static_cast<std::ptrdiff_t>(mStart),
-                                                all.end());
-  }
-
- private:
-  std::size_t mStart;
-};
-
 // A buffer provider that records every write-back.
 class RecordingBufferProvider : public ovrametadata::BufferProviderImpl {
  public:
@@ -86,9 +72,13 @@ class WritingDisabledScope {
   ~WritingDisabledScope() { ovrametadata::DisableXMPWriting(false); }
 };
 
-// Sets one text property through an update guard.
-void Edit(const boost::shared_ptr<ovrametadata::MetaDataProvider>& provider,
+// Sets one text property through an update guard, which writes it back;
+// false when the value was already stored (nothing is then written).
+bool Edit(const boost::shared_ptr<ovrametadata::MetaDataProvider>& provider,
           const ovrametadata::Path& path, const std::string& value);
+// Notes a change of path in an update guard and closes it.
+void Touch(const boost::shared_ptr<ovrametadata::MetaDataProvider>& provider,
+           const ovrametadata::Path& path);
 
 // What a recorded write-back holds for one simple property (see Raw).
 std::string WrittenRaw(const RecordingBufferProvider::Write& write, const std::string& ns,
@@ -104,8 +94,6 @@ struct CallCounter {
 
 // ---- Media files ----
 enum class MediaKind { JPEG, MP4, WAV };
-std::string MediaExtension(MediaKind kind);
-std::string MediaBytes(MediaKind kind);
 // Writes a fresh media file; with properties non-empty, also embeds a packet
 // with them (through the toolkit, so no provider is involved).
 std::filesystem::path MakeMediaFile(const std::filesystem::path& folder, const std::string& stem,

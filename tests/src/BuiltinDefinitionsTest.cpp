@@ -354,7 +354,6 @@ TEST(BuiltinDefinitions, StructPropertiesCarryTheirFieldsInTheirNamespaces) {
     const char* type;
     const char* elementType;  // null: none
   } fields[] = {
-      {kIptcCore, "CreatorContactInfo", "CiAdrCity", kIptcCore, "Iptc4xmpCore", "text", nullptr},
       {kDM, "duration", "value", kDM, nullptr, "integer", nullptr},
       {kDM, "duration", "scale", kDM, nullptr, "rational", nullptr},
       {kDM, "markers", "cuePointParams", kDM, nullptr, "seq", "CuePointParam"},

@@ -56,11 +56,6 @@ TEST(RegistryLifecycle, AnswersNothingWhileNotInitialised) {
   EXPECT_TRUE(StandardSchemaNamespace(kStandardSchema_dc).empty());
   EXPECT_TRUE(CommonSchemaDefinitions().empty());
   since.ExpectNone();
-  {
-    ovratest::LibraryScope library;
-    EXPECT_TRUE(TypeIdDefinition("text"));
-  }
-  EXPECT_FALSE(TypeIdDefinition("text"));
 }
 
 TEST_F(Registry, DuplicateTypeIsReportedAndTheFirstKept) {

@@ -281,7 +281,7 @@ TEST_F(OvrametaTest, SetAndDeleteRoundTripOnEverySampleKind) {
 }
 
 TEST_F(OvrametaTest, SetOnAFileWithoutMetadataCreatesIt) {
-  WriteFile(mDir / "bare.jpg", ovratest::media::MinimalJPEG());
+  WriteFile(mDir / "bare.jpg", xmptest::media::Jpeg());
   const Result empty = Run({"show", "bare.jpg"});
   EXPECT_EQ(empty.status, 0);
   EXPECT_EQ(empty.out, "(no metadata)\n");

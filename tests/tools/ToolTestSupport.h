@@ -17,7 +17,7 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
-#include "../providers/MediaFiles.h"
+#include "../xmp/XMPMediaFiles.h"
 #include "TestSupport.h"
 
 #ifndef OVRAMETA_EXE
@@ -34,9 +34,9 @@ namespace fs = std::filesystem;
 using ovratest::ReadFile;
 using ovratest::TempDir;
 using ovratest::WriteFile;
-using ovratest::media::ExifToolValue;
-using ovratest::media::HaveExifTool;
-using ovratest::media::RunCommand;
+using xmptest::media::ExifToolValue;
+using xmptest::media::HaveExifTool;
+using xmptest::media::RunCommand;
 
 struct Result {
   int status = -1;

@@ -14,7 +14,7 @@
 #include <ovrametadata/Initialize.h>
 #include <ovrametadata/MetadataUtils.h>
 
-#include "../providers/MediaFiles.h"
+#include "../xmp/XMPMediaFiles.h"
 #include "MetadataUtilsInternal.h"
 #include "TestSupport.h"
 
@@ -66,9 +66,9 @@ TEST_F(FormatCache, AMissingFileIsUnknownAndNotCached) {
 
 TEST_F(FormatCache, DetectsEachFormatOnceWhileTheFileIsUnchanged) {
   const std::pair<fs::path, XMP_FileFormat> files[] = {
-      {Make("a.jpg", ovratest::media::MinimalJPEG()), ovraxmp::kXMP_JPEGFile},
-      {Make("b.wav", ovratest::media::MinimalWAV()), ovraxmp::kXMP_WAVFile},
-      {Make("c.mp4", ovratest::media::MinimalMP4()), ovraxmp::kXMP_MPEG4File},
+      {Make("a.jpg", xmptest::media::Jpeg()), ovraxmp::kXMP_JPEGFile},
+      {Make("b.wav", xmptest::media::Wav()), ovraxmp::kXMP_WAVFile},
+      {Make("c.mp4", xmptest::media::Mp4()), ovraxmp::kXMP_MPEG4File},
       // An unreadable file is cached as unknown.
       {Make("notes.jpg", "just some text, no image at all"), ovraxmp::kXMP_UnknownFile},
   };
@@ -82,13 +82,13 @@ TEST_F(FormatCache, DetectsEachFormatOnceWhileTheFileIsUnchanged) {
 }
 
 TEST_F(FormatCache, ATouchedFileIsDetectedAnewAndItsEntryReplaced) {
-  const fs::path file = Make("clip.jpg", ovratest::media::MinimalJPEG());
+  const fs::path file = Make("clip.jpg", xmptest::media::Jpeg());
   ASSERT_EQ(GetXMPFormat(U16(file)), ovraxmp::kXMP_JPEGFile);
   const pt::ptime first = detail::CachedXMPFormat(U16(file))->modified;
   // The same name now holds a WAV file, five seconds later than the JPEG
   // (set explicitly: the rewrite itself moves the time by a few ms).
   const auto firstWrite = fs::last_write_time(file);
-  ovratest::WriteFile(file, ovratest::media::MinimalWAV());
+  ovratest::WriteFile(file, xmptest::media::Wav());
   fs::last_write_time(file, firstWrite + std::chrono::seconds(5));
   EXPECT_EQ(OpensDuring([&] { EXPECT_EQ(GetXMPFormat(U16(file)), ovraxmp::kXMP_WAVFile); }), 1u);
   ExpectCached(file, ovraxmp::kXMP_WAVFile);
@@ -96,7 +96,7 @@ TEST_F(FormatCache, ATouchedFileIsDetectedAnewAndItsEntryReplaced) {
 }
 
 TEST_F(FormatCache, AddingNeverOverwritesAndNeedsAValidTime) {
-  const fs::path file = Make("added.jpg", ovratest::media::MinimalJPEG());
+  const fs::path file = Make("added.jpg", xmptest::media::Jpeg());
   const pt::ptime when(boost::gregorian::date(2020, 1, 2), pt::hours(3));
   AddCachedXMPFormat(U16(file), ovraxmp::kXMP_PNGFile, when);
   AddCachedXMPFormat(U16(file), ovraxmp::kXMP_TIFFFile, when + pt::hours(1));
@@ -115,13 +115,13 @@ TEST_F(FormatCache, AddingNeverOverwritesAndNeedsAValidTime) {
 
   // Not-a-date-time for an existing file takes the file's own time, so the
   // entry is then trusted without opening.
-  const fs::path other = Make("other.wav", ovratest::media::MinimalWAV());
+  const fs::path other = Make("other.wav", xmptest::media::Wav());
   AddCachedXMPFormat(U16(other), ovraxmp::kXMP_PNGFile, pt::ptime(pt::not_a_date_time));
   EXPECT_EQ(OpensDuring([&] { EXPECT_EQ(GetXMPFormat(U16(other)), ovraxmp::kXMP_PNGFile); }), 0u);
 }
 
 TEST_F(FormatCache, ErasingForgetsThePath) {
-  const fs::path file = Make("erase.wav", ovratest::media::MinimalWAV());
+  const fs::path file = Make("erase.wav", xmptest::media::Wav());
   GetXMPFormat(U16(file));
   EraseCachedXMPFormat(U16(file));
   EXPECT_FALSE(detail::CachedXMPFormat(U16(file)));
@@ -132,9 +132,9 @@ TEST_F(FormatCache, ErasingForgetsThePath) {
 TEST_F(FormatCache, EightThreadsAtOnceAllGetTheRightFormat) {
   std::vector<std::pair<std::u16string, XMP_FileFormat>> files;
   for (int i = 0; i < 6; ++i) {
-    files.emplace_back(U16(Make("j" + std::to_string(i) + ".jpg", ovratest::media::MinimalJPEG())),
+    files.emplace_back(U16(Make("j" + std::to_string(i) + ".jpg", xmptest::media::Jpeg())),
                        ovraxmp::kXMP_JPEGFile);
-    files.emplace_back(U16(Make("w" + std::to_string(i) + ".wav", ovratest::media::MinimalWAV())),
+    files.emplace_back(U16(Make("w" + std::to_string(i) + ".wav", xmptest::media::Wav())),
                        ovraxmp::kXMP_WAVFile);
   }
   std::atomic<int> wrong{0};
@@ -167,7 +167,7 @@ TEST_F(FormatCache, EightThreadsAtOnceAllGetTheRightFormat) {
 TEST(AssociatedFiles, AMediaFileListsItselfThenItsSidecarAndAppends) {
   ovratest::TempDir dir;
   const fs::path file = dir / "shot.jpg";
-  ovratest::WriteFile(file, ovratest::media::MinimalJPEG());
+  ovratest::WriteFile(file, xmptest::media::Jpeg());
   std::vector<std::u16string> files = {u"kept"};
   ASSERT_TRUE(GetAssociatedFiles(U16(file), files));
   ASSERT_GE(files.size(), 2u);

@@ -16,6 +16,8 @@
 #include <string>
 #include <vector>
 
+#include "XMPMediaFiles.h"
+
 namespace hostile {
 
 inline const char kHead[] =
@@ -90,24 +92,17 @@ inline std::string Wrapped(const std::string& packet) {
 
 // ---- Media files ----
 
-inline void BE16(std::string& s, std::uint32_t v) {
-  s += static_cast<char>((v >> 8) & 0xFF);
-  s += static_cast<char>(v & 0xFF);
-}
-inline void BE32(std::string& s, std::uint32_t v) {
-  BE16(s, v >> 16);
-  BE16(s, v & 0xFFFF);
-}
-inline void LE32(std::string& s, std::uint32_t v) {
-  for (int i = 0; i < 4; ++i) s += static_cast<char>((v >> (8 * i)) & 0xFF);
-}
+using xmptest::media::Box;
+using xmptest::media::Put16BE;
+using xmptest::media::Put32BE;
+using xmptest::media::Put32LE;
 
 // Inserts APP1 segments right after the SOI marker of a JPEG.
 inline std::string JpegWithSegments(const std::string& jpeg, const std::vector<std::string>& app1Contents) {
   std::string segments;
   for (const std::string& content : app1Contents) {
     segments += "\xFF\xE1";
-    BE16(segments, static_cast<std::uint32_t>(content.size() + 2));
+    Put16BE(segments, static_cast<std::uint32_t>(content.size() + 2));
     segments += content;
   }
   return jpeg.substr(0, 2) + segments + jpeg.substr(2);
@@ -134,18 +129,12 @@ inline std::string JpegWithExtendedXMP(const std::string& jpeg, const std::strin
   for (std::size_t offset = 0; offset < extended.size(); offset += chunk) {
     std::string content("http://ns.adobe.com/xmp/extension/", 35);
     content += guid;
-    BE32(content, static_cast<std::uint32_t>(extended.size()));
-    BE32(content, static_cast<std::uint32_t>(offset));
+    Put32BE(content, static_cast<std::uint32_t>(extended.size()));
+    Put32BE(content, static_cast<std::uint32_t>(offset));
     content += extended.substr(offset, chunk);
     contents.push_back(content);
   }
   return JpegWithSegments(jpeg, contents);
-}
-
-inline std::string Box(const std::string& type, const std::string& payload) {
-  std::string s;
-  BE32(s, static_cast<std::uint32_t>(8 + payload.size()));
-  return s + type + payload;
 }
 
 inline std::string XMPBox(const std::string& packet) {
@@ -170,7 +159,7 @@ inline std::string WithBrokenBoxSize(std::string mp4, const std::string& type) {
 
 inline std::string RiffChunk(const std::string& id, const std::string& payload) {
   std::string s = id;
-  LE32(s, static_cast<std::uint32_t>(payload.size()));
+  Put32LE(s, static_cast<std::uint32_t>(payload.size()));
   s += payload;
   if (payload.size() & 1) s += '\0';
   return s;
@@ -180,7 +169,7 @@ inline std::string RiffChunk(const std::string& id, const std::string& payload) 
 inline std::string WavWithChunk(const std::string& wav, const std::string& chunk) {
   std::string body = wav.substr(8) + chunk;
   std::string s = "RIFF";
-  LE32(s, static_cast<std::uint32_t>(body.size()));
+  Put32LE(s, static_cast<std::uint32_t>(body.size()));
   return s + body;
 }
 

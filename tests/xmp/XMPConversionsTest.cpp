@@ -1,5 +1,6 @@
 // Text forms of values and date arithmetic.
 #include <string>
+#include <utility>
 
 #include <gtest/gtest.h>
 
@@ -62,20 +63,17 @@ TEST(XMPConversions, MalformedDatesRaiseBadValue) {
 }
 
 TEST(XMPConversions, UtcConversionCarriesAcrossDaysMonthsAndYears) {
-  XMP_DateTime d;
-  XMPUtils::ConvertToDate("2024-01-01T01:30:00+02:00", &d);
-  XMPUtils::ConvertToUTCTime(&d);
-  std::string text;
-  XMPUtils::ConvertFromDate(d, &text);
-  EXPECT_EQ(text, "2023-12-31T23:30Z");
-  XMPUtils::ConvertToDate("2024-02-28T22:00:00-05:00", &d);  // leap year
-  XMPUtils::ConvertToUTCTime(&d);
-  XMPUtils::ConvertFromDate(d, &text);
-  EXPECT_EQ(text, "2024-02-29T03:00Z");
-  XMPUtils::ConvertToDate("2024-03-05", &d);  // no time: unchanged
-  XMPUtils::ConvertToUTCTime(&d);
-  XMPUtils::ConvertFromDate(d, &text);
-  EXPECT_EQ(text, "2024-03-05");
+  const std::pair<const char*, const char*> cases[] = {{"2024-01-01T01:30:00+02:00", "2023-12-31T23:30Z"},
+                                                       {"2024-02-28T22:00:00-05:00", "2024-02-29T03:00Z"},  // leap year
+                                                       {"2024-03-05", "2024-03-05"}};  // no time: unchanged
+  for (const auto& [local, utc] : cases) {
+    XMP_DateTime d;
+    XMPUtils::ConvertToDate(local, &d);
+    XMPUtils::ConvertToUTCTime(&d);
+    std::string text;
+    XMPUtils::ConvertFromDate(d, &text);
+    EXPECT_EQ(text, utc) << local;
+  }
 }
 
 TEST(XMPConversions, LocalTimeAndNowCarryAZone) {
@@ -100,11 +98,8 @@ TEST(XMPConversions, NumbersAndBooleans) {
   EXPECT_EQ(XMPUtils::ConvertToInt("-2147483648"), INT32_MIN);
   EXPECT_DOUBLE_EQ(XMPUtils::ConvertToFloat(" 1.5e3 "), 1500.0);
   EXPECT_DOUBLE_EQ(XMPUtils::ConvertToFloat("-0.25"), -0.25);
-  EXPECT_TRUE(XMPUtils::ConvertToBool("True"));
-  EXPECT_TRUE(XMPUtils::ConvertToBool(" t"));
-  EXPECT_TRUE(XMPUtils::ConvertToBool("1"));
-  EXPECT_FALSE(XMPUtils::ConvertToBool("FALSE"));
-  EXPECT_FALSE(XMPUtils::ConvertToBool("0"));
+  for (const char* text : {"True", " t", "1"}) EXPECT_TRUE(XMPUtils::ConvertToBool(text)) << text;
+  for (const char* text : {"FALSE", "0"}) EXPECT_FALSE(XMPUtils::ConvertToBool(text)) << text;
   std::string text;
   XMPUtils::ConvertFromInt64(INT64_MIN, &text);
   EXPECT_EQ(text, "-9223372036854775808");
@@ -114,11 +109,10 @@ TEST(XMPConversions, NumbersAndBooleans) {
   EXPECT_EQ(text, "0.333333");
   XMPUtils::ConvertFromFloat(1.0 / 3, "%.3g", &text);
   EXPECT_EQ(text, "0.333");
-  EXPECT_EQ(xmptest::ErrorIdOf([] { XMPUtils::ConvertToInt64("9223372036854775808"); }), kXMPErr_BadValue);
-  EXPECT_EQ(xmptest::ErrorIdOf([] { XMPUtils::ConvertToInt64("12abc"); }), kXMPErr_BadValue);
-  EXPECT_EQ(xmptest::ErrorIdOf([] { XMPUtils::ConvertToInt64(""); }), kXMPErr_BadValue);
+  for (const char* text : {"9223372036854775808", "12abc", ""})
+    EXPECT_EQ(xmptest::ErrorIdOf([&] { XMPUtils::ConvertToInt64(text); }), kXMPErr_BadValue) << text;
+  for (const char* text : {"1.5x", "--1"})
+    EXPECT_EQ(xmptest::ErrorIdOf([&] { XMPUtils::ConvertToFloat(text); }), kXMPErr_BadValue) << text;
   EXPECT_EQ(xmptest::ErrorIdOf([] { XMPUtils::ConvertToInt("2147483648"); }), kXMPErr_BadValue);
-  EXPECT_EQ(xmptest::ErrorIdOf([] { XMPUtils::ConvertToFloat("1.5x"); }), kXMPErr_BadValue);
-  EXPECT_EQ(xmptest::ErrorIdOf([] { XMPUtils::ConvertToFloat("--1"); }), kXMPErr_BadValue);
   EXPECT_EQ(xmptest::ErrorIdOf([] { XMPUtils::ConvertToBool("yes"); }), kXMPErr_BadValue);
 }

@@ -59,17 +59,10 @@ TEST_F(XMPProperties, ParseAcceptsBareRdfAndEmptyAndRejectsMalformed) {
   // Trailing NUL padding is tolerated.
   const std::string packet = xmptest::RealWorldPacket();
   EXPECT_EQ(Get(xmptest::Parse(packet + std::string(16, '\0')), kXMP_NS_XMP, "Label"), "Select");
-  // Malformed, entity tricks and absurd nesting are refused quietly and
-  // leave the packet as it was.
-  std::string deep = "<x:xmpmeta xmlns:x=\"adobe:ns:meta/\"><rdf:RDF xmlns:rdf=\"" + std::string(kXMP_NS_RDF) +
-                     "\"><rdf:Description rdf:about=\"\" xmlns:ovt=\"" + kTestNS + "\"><ovt:D rdf:parseType=\"Resource\">";
-  for (int i = 0; i < 200000; ++i) deep += "<ovt:a rdf:parseType=\"Resource\">";
-  for (int i = 0; i < 200000; ++i) deep += "</ovt:a>";
-  deep += "</ovt:D></rdf:Description></rdf:RDF></x:xmpmeta>";
-  const std::string bomb = "<?xml version=\"1.0\"?><!DOCTYPE x [<!ENTITY a \"aaaaaaaaaa\"><!ENTITY b \"&a;&a;&a;&a;\">]>" +
-                           packet.substr(packet.find("<x:xmpmeta"));
+  // Malformed text is refused quietly and leaves the packet as it was
+  // (hostile packets: XMPFilesTest.cpp).
   for (const std::string& bad : {std::string("<x:xmpmeta xmlns:x=\"adobe:ns:meta/\"><rdf:RDF"),
-                                 std::string("\x01\x02 not xml at all <<<"), deep, bomb}) {
+                                 std::string("\x01\x02 not xml at all <<<")}) {
     XMPMeta target;
     target.SetProperty(kTestNS, "Kept", "yes");
     testing::internal::CaptureStderr();

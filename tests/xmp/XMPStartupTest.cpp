@@ -20,13 +20,6 @@ TEST(XMPStartup, InitializeIsCountedAndTerminateOfExtraHoldsKeepsToolkitUp) {
   EXPECT_NE(meta.GetInternalRef(), nullptr);
 }
 
-TEST(XMPStartup, VersionTextsNameTheCoreAndTheFilesLayerAndClientNameIsKept) {
-  EXPECT_NE(XMPMeta::GetVersionInfo().find("XMP Core"), std::string::npos);
-  EXPECT_NE(XMPFiles::GetVersionInfo().find("Exempi"), std::string::npos);
-  EXPECT_NE(XMPFiles::GetVersionInfo().find(XMPMeta::GetVersionInfo()), std::string::npos);
-  EXPECT_EQ(XMPMeta::GetClientName(), "ovraxmp tests");
-}
-
 TEST(XMPPacketHandle, PacketLivesUntilItsLastReference) {
   XMPMetaRef ref = nullptr;
   {
