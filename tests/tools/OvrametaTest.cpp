@@ -408,6 +408,16 @@ TEST_F(OvrametaTest, UsageErrorsExitWithTwo) {
   EXPECT_EQ(Run({"--help"}).status, 0);
 }
 
+TEST_F(OvrametaTest, VersionUsageAndMessagesNameTheToolNotThePathItRanBy) {
+  const Result version = Run({"--version"});
+  EXPECT_EQ(version.status, 0);
+  EXPECT_EQ(version.out, "ovrameta " OVRAMETA_VERSION "\n");
+  ExpectContains(Run({"show", "--help"}).out, {"\nUsage: ovrameta show [OPTIONS] FILE...\n"});
+  const Result missing = Run({"show"});
+  EXPECT_EQ(missing.status, 2);
+  EXPECT_EQ(missing.err, "ovrameta: FILE is required\nRun 'ovrameta --help' for more information.\n");
+}
+
 TEST_F(OvrametaTest, SchemasListsPropertiesWithTypesAndStructureFields) {
   const Result all = Run({"schemas"});
   ASSERT_EQ(all.status, 0) << all.err;

@@ -29,8 +29,13 @@ int main(int argc, char** argv) {
   for (int signal : {SIGINT, SIGTERM, SIGHUP}) std::signal(signal, OnTerminatingSignal);
   // Output goes through std::cout only.
   std::ios::sync_with_stdio(false);
-  CLI::App app{"Shows and edits the XMP metadata of media files."};
+  // Named here: usage and messages would otherwise show argv[0], the path it was run by.
+  CLI::App app{"Shows and edits the XMP metadata of media files.", "ovrameta"};
+  app.set_version_flag("--version", "ovrameta " OVRAMETA_VERSION);
   app.require_subcommand(1);
+  app.failure_message([](const CLI::App*, const CLI::Error& error) {
+    return "ovrameta: " + std::string(error.what()) + "\nRun 'ovrameta --help' for more information.\n";
+  });
   // Options of the tool itself are also accepted after the command.
   app.fallthrough();
   unsigned jobs = 0;
