@@ -6,6 +6,8 @@
 // (Providers.h) from one thread at a time.
 #pragma once
 
+#include <vector>
+
 #include <boost/shared_ptr.hpp>
 
 #include <ovrametadata/Common.h>
@@ -82,6 +84,16 @@ OVRAMETADATA_EXPORT bool DeleteArrayItem(XMPMetaRef xmp, const Path& path, int i
 // handle is null or the toolkit refuses (reported as kErrorWritingXMP).
 OVRAMETADATA_EXPORT bool ApplyTemplate(XMPMetaRef destination, XMPMetaRef templateXMP,
                                        TemplateImportOptions options);
+
+// ---- Copying ----
+
+// Copies each value at paths (whole: structures and arrays with everything
+// below them) from source into destination, replacing what destination
+// holds there; a value source lacks is deleted from destination. Answers
+// the paths whose value in destination changed. Toolkit errors are reported
+// (kErrorWritingXMP) and leave that path as it was.
+OVRAMETADATA_EXPORT std::vector<Path> CopyValues(XMPMetaRef source, XMPMetaRef destination,
+                                                 const std::vector<Path>& paths);
 
 // ---- Minimal float ----
 

@@ -265,6 +265,42 @@ bool ApplyTemplate(XMPMetaRef destination, XMPMetaRef templateXMP, TemplateImpor
 }
 
 // ---------------------------------------------------------------------------
+// Copying
+
+std::vector<Path> CopyValues(XMPMetaRef source, XMPMetaRef destination, const std::vector<Path>& paths) {
+  std::vector<Path> changed;
+  if (!source || !destination) return changed;
+  const ovraxmp::XMPMeta from(source);
+  ovraxmp::XMPMeta to(destination);
+  for (const Path& path : paths) {
+    const std::string& ns = path.namespaceURI;
+    const std::string& name = path.description;
+    try {
+      if (!from.DoesPropertyExist(ns, name)) {
+        // Deleted as any deletion is, so that an aggregate passes it on.
+        if (DeleteValue(destination, path)) changed.push_back(path);
+        continue;
+      }
+      // Compared as serialised subtrees: a copy of an equal value is no change.
+      ovraxmp::XMPMeta before, after;
+      if (to.DoesPropertyExist(ns, name)) ovraxmp::XMPUtils::DuplicateSubtree(to, &before, ns, name, ns, name);
+      ovraxmp::XMPUtils::DuplicateSubtree(from, &after, ns, name, ns, name);
+      std::string beforeText, afterText;
+      before.SerializeToBuffer(&beforeText, ovraxmp::kXMP_OmitPacketWrapper | ovraxmp::kXMP_UseCompactFormat);
+      after.SerializeToBuffer(&afterText, ovraxmp::kXMP_OmitPacketWrapper | ovraxmp::kXMP_UseCompactFormat);
+      if (beforeText == afterText && !to.IsMultiValued(ns, name)) continue;
+      to.DeleteProperty(ns, name);
+      ovraxmp::XMPUtils::DuplicateSubtree(from, &to, ns, name, ns, name);
+      to.ClearMultiValueInfo(ns, name);
+      changed.push_back(path);
+    } catch (...) {
+      ReportInvalidData(kErrorWritingXMP, path);
+    }
+  }
+  return changed;
+}
+
+// ---------------------------------------------------------------------------
 // Minimal float
 
 void SetMinimalFloatValue(const Value& value, double number) {

@@ -1,5 +1,6 @@
 // End-to-end tests of the ovrameta tool: the built program runs on copies of
 // the bundled samples in temporary folders, and ExifTool checks what it wrote.
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 
@@ -466,6 +467,67 @@ TEST_F(OvrametaTest, OvrametaReadsWhatExifToolWrote) {
                 {"harbour.jpg", "Iptc4xmpCore:CountryCode", "CA"},
                 {"interview.mp4", "xmpDM:takeNumber", "9"},
                 {"interview.mp4", "xmpDM:markers[3]/xmpDM:name", "Wrap"}});
+}
+
+TEST_F(OvrametaTest, ListEditsDryRunsKeptTimesAndNoSplit) {
+  Sample("harbour.jpg", "a.jpg");
+  Sample("harbour.jpg", "b.jpg");
+  ASSERT_EQ(Run({"set", "b.jpg", "dc:subject-=boats"}).status, 0);
+  // Each file's own list decides: an item is added where it is missing.
+  ASSERT_EQ(Run({"set", "a.jpg", "b.jpg", "dc:subject+=travel", "dc:subject+=dawn", "dc:subject-=harbour"}).status, 0);
+  ExpectValues({{"a.jpg", "dc:subject", "dawn; boats; travel"}, {"b.jpg", "dc:subject", "dawn; travel"}});
+  EXPECT_EQ(Run({"set", "a.jpg", "xmp:Label+=x"}).status, 2);
+
+  const std::string before = ReadFile(mDir / "a.jpg");
+  const Result dry = Run({"set", "--dry-run", "a.jpg", "dc:title=New", "dc:subject+=boats"});
+  EXPECT_EQ(dry.status, 0);
+  EXPECT_EQ(dry.out, "a.jpg: dc:title: \"Harbour at dawn\" -> \"New\"\n");
+  EXPECT_EQ(ReadFile(mDir / "a.jpg"), before);
+
+  struct timespec old[2] = {{1000000000, 0}, {1000000000, 0}};
+  ASSERT_EQ(::utimensat(AT_FDCWD, (mDir / "a.jpg").c_str(), old, 0), 0);
+  ASSERT_EQ(Run({"set", "-P", "--no-split", "a.jpg", "dc:subject=one; two"}).status, 0);
+  struct stat after {};
+  ASSERT_EQ(::stat((mDir / "a.jpg").c_str(), &after), 0);
+  EXPECT_EQ(after.st_mtim.tv_sec, 1000000000);
+  EXPECT_EQ(Get(mDir / "a.jpg", "dc:subject[1]"), "one; two");
+  EXPECT_EQ(Get(mDir / "a.jpg", "dc:subject[2]"), "");
+}
+
+TEST_F(OvrametaTest, ExportImportCopyAndSidecars) {
+  Sample("harbour.jpg", "a.jpg");
+  Sample("interview.mp4", "m.mp4");
+  // An export read back in changes nothing.
+  for (const std::string format : {"--csv", "--json"}) {
+    const Result exported = Run({"get", format, "a.jpg", "m.mp4"});
+    ASSERT_EQ(exported.status, 0) << exported.err;
+    WriteFile(mDir / "rows", exported.out);
+    const std::string photo = ReadFile(mDir / "a.jpg"), clip = ReadFile(mDir / "m.mp4");
+    const Result imported = Run({"set", format, "rows"});
+    EXPECT_EQ(imported.status, 0) << imported.err;
+    EXPECT_EQ(ReadFile(mDir / "a.jpg"), photo) << format;
+    EXPECT_EQ(ReadFile(mDir / "m.mp4"), clip) << format;
+  }
+  WriteFile(mDir / "rows.csv", "file,dc:title,dc:subject,xmp:Rating\na.jpg,\"Quay, at dusk\",\"a; \"\"b;c\"\"\",\n");
+  ASSERT_EQ(Run({"set", "--csv", "rows.csv"}).status, 0);
+  ExpectValues({{"a.jpg", "dc:title", "Quay, at dusk"}, {"a.jpg", "dc:subject[2]", "b;c"},
+                {"a.jpg", "xmp:Rating", "Four Stars"}});
+
+  Sample("interview.mp4", "n.mp4");
+  ASSERT_EQ(Run({"copy", "a.jpg", "m.mp4", "n.mp4", "dc:title", "dc:subject"}).status, 0);
+  ExpectValues({{"n.mp4", "dc:title", "Quay, at dusk"}, {"m.mp4", "dc:subject", "a; \"b;c\""}});
+
+  // Camera raw files take their edits in a sidecar; --sidecar asks for one.
+  WriteFile(mDir / "shot.cr2", ReadFile(mDir / "a.jpg"));
+  const std::string raw = ReadFile(mDir / "shot.cr2");
+  ASSERT_EQ(Run({"set", "shot.cr2", "xmp:Label=Raw"}).status, 0);
+  EXPECT_EQ(ReadFile(mDir / "shot.cr2"), raw);
+  EXPECT_EQ(Get(mDir / "shot.cr2", "xmp:Label"), "Raw");
+  EXPECT_TRUE(fs::exists(mDir / "shot.xmp"));
+  ASSERT_EQ(Run({"--sidecar", "--sidecar-name", "full", "set", "a.jpg", "xmp:Label=Beside"}).status, 0);
+  EXPECT_EQ(Run({"--sidecar", "get", "a.jpg", "xmp:Label"}).out, "Beside\n");
+  EXPECT_EQ(Get(mDir / "a.jpg", "xmp:Label"), "Selected");
+  EXPECT_TRUE(fs::exists(mDir / "a.jpg.xmp"));
 }
 
 }  // namespace

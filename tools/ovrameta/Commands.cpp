@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
+#include <map>
 #include <fstream>
 #include <iostream>
 #include <memory>
@@ -15,6 +16,7 @@
 #include <boost/make_shared.hpp>
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/stat.h>
 #include <nlohmann/json.hpp>
 #include <unistd.h>
 
@@ -24,6 +26,8 @@
 #include "Names.h"
 #include "Parallel.h"
 #include "Progress.h"
+#include "Sidecars.h"
+#include "Transfer.h"
 #include "Reading.h"
 #include "TextUtil.h"
 #include "Validation.h"
@@ -152,6 +156,8 @@ class BatchedFileProvider : public FileProvider {
     mHasPending = true;
   }
 
+  bool Pending() const { return mHasPending; }
+
   // Writes what the last write-backs asked for; nothing when none did.
   // The reason when the file was to be written and was left as it was.
   std::string Flush() {
@@ -167,7 +173,9 @@ class BatchedFileProvider : public FileProvider {
 };
 
 struct OpenedFile {
-  std::string name;
+  std::string given;  // as named on the command line
+  std::string name;   // the file read: the given one or its sidecar
+  bool created = false;  // a sidecar made for this edit
   boost::shared_ptr<FileProvider> provider;
   boost::shared_ptr<BatchedFileProvider> batched;  // set when opened for a batched write
 };
@@ -175,9 +183,39 @@ struct OpenedFile {
 // Opens one media file. An unreadable file, or one the toolkit cannot
 // handle, is reported (status 2) and gives false. A readable file without
 // XMP gives a provider without metadata.
-bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out,
+SidecarOptions& Sidecars() {
+  static SidecarOptions options;
+  return options;
+}
+
+bool OpenFile(const std::string& given, Reporter& reporter, OpenedFile& out,
               bool batchWrites = false) {
   std::error_code error;
+  const std::string name = MetadataFile(given, Sidecars(), batchWrites);
+  bool created = false;
+  if (name != given) {
+    if (!std::filesystem::is_regular_file(given, error)) {
+      reporter.Error(given, "cannot read file: No such file or directory", kExitUsage);
+      return false;
+    }
+    // A sidecar that a write needs is made; it goes again if nothing is written.
+    if (batchWrites && !std::filesystem::exists(name, error)) {
+      if (!CreateSidecar(name)) {
+        reporter.Error(name, std::string("cannot make the sidecar: ") + std::strerror(errno), kExitUsage);
+        return false;
+      }
+      created = true;
+    }
+  }
+  struct RemoveUnused {
+    const std::string& path;
+    bool& remove;
+    ~RemoveUnused() {
+      if (remove) std::filesystem::remove(path);
+    }
+  };
+  bool removeSidecar = created;
+  const RemoveUnused cleanup{name, removeSidecar};
   // One status for both checks: runs over many files pay per system call.
   const auto status = std::filesystem::status(name, error);
   if (!std::filesystem::exists(status)) {
@@ -198,10 +236,10 @@ bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out,
   // folder-based formats misread relative ones with a folder in them. The
   // working folder is asked once.
   static const std::filesystem::path workingFolder = std::filesystem::current_path(error);
-  const std::filesystem::path given(name);
+  const std::filesystem::path relative(name);
   const std::filesystem::path absolute =
-      given.is_absolute() || workingFolder.empty() ? std::filesystem::absolute(given, error)
-                                                   : workingFolder / given;
+      relative.is_absolute() || workingFolder.empty() ? std::filesystem::absolute(relative, error)
+                                                      : workingFolder / relative;
   const UTF16String path = ToUTF16(absolute.lexically_normal().string());
   boost::shared_ptr<FileProvider> provider;
   if (batchWrites) {
@@ -216,8 +254,11 @@ bool OpenFile(const std::string& name, Reporter& reporter, OpenedFile& out,
     out.batched.reset();
     return false;
   }
+  out.given = given;
   out.name = name;
+  out.created = created;
   out.provider = provider;
+  removeSidecar = false;
   return true;
 }
 
@@ -356,6 +397,29 @@ bool ReadLanguage(XMPMetaRef xmp, const ResolvedName& name, const ReadOptions& o
   return true;
 }
 
+// One CSV row per file: the named columns, or every column some file has,
+// in the order they first come.
+void PrintTable(const std::vector<std::vector<Cell>>& rows, const std::vector<std::string>& names) {
+  // Named structures come as their fields, so the columns are what the
+  // rows hold; a name no file has is a column all the same.
+  std::vector<std::string> columns = {"file"};
+  std::set<std::string> known(columns.begin(), columns.end());
+  for (const auto& row : rows)
+    for (const auto& cell : row)
+      if (known.insert(cell.first).second) columns.push_back(cell.first);
+  for (const auto& name : names)
+    if (known.insert(WithoutLanguage(name, nullptr)).second && !known.count(name)) columns.push_back(name);
+  std::string line;
+  for (const auto& column : columns) line += (line.empty() ? "" : ",") + CSVField(column);
+  std::cout << line << '\n';
+  for (const auto& row : rows) {
+    std::map<std::string, std::string> values(row.begin(), row.end());
+    line.clear();
+    for (std::size_t i = 0; i < columns.size(); ++i) line += (i ? "," : "") + CSVField(values[columns[i]]);
+    std::cout << line << '\n';
+  }
+}
+
 // ---------------------------------------------------------------------------
 // Arguments
 
@@ -369,7 +433,8 @@ void SplitArguments(const std::vector<std::string>& arguments, std::vector<std::
                     std::vector<std::string>& names) {
   for (const auto& argument : arguments) {
     const auto equals = argument.find('=');
-    const std::string head = equals == std::string::npos ? argument : argument.substr(0, equals);
+    std::string head = equals == std::string::npos ? argument : argument.substr(0, equals);
+    if (equals != std::string::npos && !head.empty() && (head.back() == '+' || head.back() == '-')) head.pop_back();
     if (LooksLikeName(head) && !IsExistingPath(argument)) {
       names.push_back(argument);
     } else {
@@ -490,8 +555,8 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
     reporter.Error("", "get: no file given", kExitUsage);
     return reporter.status();
   }
-  if (nameTexts.empty() && !options.json) {
-    reporter.Error("", "get: no property name given (prefix:Property), or use --json", kExitUsage);
+  if (nameTexts.empty() && !options.json && !options.csv) {
+    reporter.Error("", "get: no property name given (prefix:Property), or use --json or --csv", kExitUsage);
     return reporter.status();
   }
   std::vector<ResolvedName> names;
@@ -513,17 +578,20 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
   if (reporter.status() != kExitSuccess) return reporter.status();
 
   ReadOptions readOptions;
-  readOptions.raw = options.raw || options.json;
-  readOptions.items = options.json;
+  const bool machine = options.json || options.csv;
+  readOptions.raw = options.raw || machine;
+  readOptions.items = machine;
   readOptions.types = options.json;
-  const bool bare = files.size() == 1 && names.size() == 1 && !options.json;
+  const bool bare = files.size() == 1 && names.size() == 1 && !machine;
   struct Read {
     Reporter notes = Reporter::Buffered();
     std::string text;  // for standard output
     Json entry;        // with --json
+    std::vector<Cell> cells;  // with --csv
   };
   std::vector<Read> reads(files.size());
   Json output = Json::array();
+  std::vector<std::vector<Cell>> table;
   Progress progress(files.size(), "files read");
   reporter.SetProgress(&progress);
   // Reading stored text flips a process-wide switch around each read, so
@@ -540,10 +608,16 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
         Json properties = Json::array();
         if (names.empty()) {
           for (const auto& schema : ReadAllValues(file.provider, readOptions)) {
-            for (const auto& value : schema.values) properties.push_back(NodeJson(value, true));
+            for (const auto& value : schema.values) {
+              if (options.csv) Flatten(value, out.cells);
+              else properties.push_back(NodeJson(value, true));
+            }
           }
           for (const auto& undefined : ReadUndefinedValues(*reader)) {
-            for (const auto& value : undefined.values) properties.push_back(NodeJson(value, true));
+            for (const auto& value : undefined.values) {
+              if (options.csv) Flatten(value, out.cells);
+              else properties.push_back(NodeJson(value, true));
+            }
           }
         }
         std::ostringstream text;
@@ -576,7 +650,9 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
             }
             continue;
           }
-          if (options.json) {
+          if (options.csv) {
+            Flatten(node, out.cells);
+          } else if (options.json) {
             properties.push_back(NodeJson(node, true));
           } else if (bare && node.kind == ValueNode::kSimple) {
             text << (options.raw && node.raw ? *node.raw : node.value) << '\n';
@@ -593,6 +669,7 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
           out.entry["file"] = fileName;
           out.entry["properties"] = std::move(properties);
         }
+        if (options.csv) out.cells.insert(out.cells.begin(), Cell("file", fileName));
       },
       [&](std::size_t i) {
         Read& out = reads[i];
@@ -602,11 +679,13 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
           std::cout << out.text;
         }
         if (!out.entry.is_null()) output.push_back(std::move(out.entry));
+        if (!out.cells.empty()) table.push_back(std::move(out.cells));
         out = Read();
         progress.Step();
       });
   progress.Clear();
   if (options.json) std::cout << output.dump(2) << '\n';
+  if (options.csv) PrintTable(table, nameTexts);
   return reporter.status();
 }
 
@@ -627,7 +706,324 @@ std::string MissingArrayItem(XMPMetaRef xmp, const std::string& fullName) {
   return std::string();
 }
 
-int SetCommand(const std::vector<std::string>& arguments, const std::vector<std::string>& deletes) {
+namespace {
+
+// One change asked for: NAME=VALUE, NAME+=ITEM, NAME-=ITEM, --delete NAME.
+struct Edit {
+  enum Kind { kSet, kAdd, kRemove, kDelete };
+  Kind kind = kSet;
+  ResolvedName name;
+  std::string value;
+};
+
+bool IsListOfText(const ResolvedName& name) {
+  const auto primitive = PrimitiveTypeOfPath(name.path);
+  return primitive && (*primitive == kPrimitiveType_bag || *primitive == kPrimitiveType_seq);
+}
+
+// Reads "NAME=VALUE", "NAME+=ITEM" or "NAME-=ITEM"; the value is checked
+// against the definitions and put in its stored form. The reason when not.
+bool ParseEdit(const std::string& text, bool noSplit, Edit& out, std::string& error) {
+  const auto equals = text.find('=');
+  if (equals == std::string::npos) {
+    error = Quoted(text) + ": expected NAME=VALUE";
+    return false;
+  }
+  Edit edit;
+  std::string name = text.substr(0, equals);
+  if (!name.empty() && (name.back() == '+' || name.back() == '-')) {
+    edit.kind = name.back() == '+' ? Edit::kAdd : Edit::kRemove;
+    name.pop_back();
+  }
+  if (!ResolveName(name, edit.name, error)) return false;
+  edit.value = text.substr(equals + 1);
+  const bool list = IsListOfText(edit.name);
+  if (edit.kind != Edit::kSet && (!list || !edit.name.language.empty())) {
+    error = Quoted(text) + ": " + name + " is not a list; += and -= add and remove list items";
+    return false;
+  }
+  // One item: the library would split it at ";".
+  if ((noSplit || edit.kind != Edit::kSet) && list) edit.value = ItemsText({edit.value});
+  const std::string reason = CheckValue(edit.name.path, *edit.name.entry, edit.value);
+  if (!reason.empty()) {
+    error = name + ": refused: " + reason;
+    return false;
+  }
+  out = std::move(edit);
+  return true;
+}
+
+// The texts of the items of a list, as stored.
+std::vector<std::string> ItemTexts(XMPMetaRef xmp, const Path& path) {
+  std::vector<std::string> items;
+  const int count = CountArrayItems(xmp, path);
+  for (int i = 1; i <= count; ++i) {
+    UTF8String text;
+    GetValue(xmp, CreatePathFromArrayItem(path, i), text);
+    items.push_back(text);
+  }
+  return items;
+}
+
+// The text of one item, as ItemsText wrote it: quotes undone.
+std::string ItemOf(const std::string& text) {
+  if (text.size() < 2 || text.front() != '"' || text.back() != '"') return text;
+  std::string item;
+  for (std::size_t i = 1; i + 1 < text.size(); ++i) {
+    item += text[i];
+    if (text[i] == '"') ++i;
+  }
+  return item;
+}
+
+// Applies edits to one packet: an aggregate's, or one file's. List edits
+// go to files one by one (an item is added where it is missing), the others
+// where they are given. False when one could not go in.
+bool ApplyEdits(XMPMetaRef xmp, const std::vector<Edit>& edits, bool listEdits, std::vector<Path>& changes,
+                Reporter& reporter, const std::string& context) {
+  const int before = reporter.status();
+  for (const Edit& edit : edits) {
+    const bool listEdit = edit.kind == Edit::kAdd || edit.kind == Edit::kRemove;
+    if (listEdit != listEdits) continue;
+    const auto& name = edit.name;
+    const std::size_t reports = GetErrorInfos().size();
+    switch (edit.kind) {
+      case Edit::kSet: {
+        const std::string missing = MissingArrayItem(xmp, name.name);
+        if (!missing.empty()) {
+          reporter.Error(context, name.name + ": " + missing + " does not exist", kExitUsage);
+          continue;
+        }
+        // A value already there is not written again.
+        const bool written = name.language.empty() ? SetValue(xmp, name.path, edit.value)
+                                                   : SetAltTextValue(xmp, name.path, name.language, edit.value);
+        if (written) changes.push_back(name.path);
+        break;
+      }
+      case Edit::kDelete:
+        if (DeleteValue(xmp, name.path)) {
+          changes.push_back(name.path);
+        } else {
+          reporter.Error(context, name.name + ": no value to delete", kExitAbsent);
+        }
+        break;
+      case Edit::kAdd: {
+        const std::string item = ItemOf(edit.value);
+        const auto items = ItemTexts(xmp, name.path);
+        if (std::find(items.begin(), items.end(), item) != items.end()) break;
+        const int count = static_cast<int>(items.size());
+        if (AddArrayItem(xmp, name.path, count) &&
+            SetValue(xmp, CreatePathFromArrayItem(name.path, count + 1), item))
+          changes.push_back(name.path);
+        break;
+      }
+      case Edit::kRemove: {
+        const std::string item = ItemOf(edit.value);
+        const auto items = ItemTexts(xmp, name.path);
+        for (int i = static_cast<int>(items.size()); i-- > 0;) {
+          if (items[i] == item && DeleteArrayItem(xmp, name.path, i)) changes.push_back(name.path);
+        }
+        break;
+      }
+    }
+    // The library reports a value it could not write, or that did not read
+    // back as written.
+    if (GetErrorInfos().size() != reports)
+      reporter.Error(context, name.name + ": the value could not be written", kExitUsage);
+  }
+  reporter.FlushLibrary(context);
+  return reporter.status() == before;
+}
+
+// What each named value of a file reads as, for --dry-run.
+std::map<std::string, std::string> ReadNamed(const OpenedFile& file, const std::vector<Edit>& edits) {
+  std::map<std::string, std::string> values;
+  MetaDataReadAccess reader(file.provider);
+  for (const Edit& edit : edits) {
+    ValueNode node;
+    const auto& name = edit.name;
+    std::string text;
+    if (!name.language.empty()) {
+      UTF8String one;
+      if (GetAltTextValue(*reader, name.path, name.language, one)) text = Quoted(one);
+    } else if (ReadValue(*reader, name.path, name.name, ReadOptions(), node)) {
+      text = Quoted(node.mixed ? "(mixed)" : node.value);
+    }
+    values[name.name] = text.empty() ? "(none)" : text;
+  }
+  return values;
+}
+
+// Opens the files to edit; those that cannot be read are named and left
+// out. Files without XMP start from an empty packet.
+std::vector<OpenedFile> OpenForEdit(const std::vector<std::string>& files, Reporter& reporter) {
+  Progress progress(files.size(), "files read");
+  reporter.SetProgress(&progress);
+  std::vector<OpenedFile> opened;
+  std::vector<std::pair<OpenedFile, Reporter>> read(files.size(), {OpenedFile(), Reporter::Buffered()});
+  ForEachInOrder(
+      files.size(), Jobs(), [&](std::size_t i) { OpenFile(files[i], read[i].second, read[i].first, true); },
+      [&](std::size_t i) {
+        reporter.Relay(read[i].second);
+        if (read[i].first.provider) opened.push_back(std::move(read[i].first));
+        progress.Step();
+      });
+  progress.Clear();
+  reporter.SetProgress(nullptr);
+  for (auto& file : opened)
+    if (!file.provider->MetaDataAccess()) file.provider->ResetToEmptyMetaData(false);
+  return opened;
+}
+
+// Writes the edited files side by side (the edit is complete in every
+// packet by now), or with --dry-run prints what would change. Sidecars
+// made for the edit go again when their file is not written.
+void WriteEdited(std::vector<OpenedFile>& opened, const EditOptions& options, Reporter& reporter,
+                 std::size_t& failed, std::size_t& unchanged,
+                 const std::vector<std::map<std::string, std::string>>& before, const std::vector<Edit>& edits) {
+  for (const auto& file : opened) {
+    if (file.batched->Pending()) continue;
+    ++unchanged;
+    if (file.created) std::filesystem::remove(file.name);
+  }
+  if (options.dryRun) {
+    for (std::size_t i = 0; i < opened.size(); ++i) {
+      const auto after = ReadNamed(opened[i], edits);
+      bool any = false;
+      for (const auto& [name, text] : after) {
+        const auto was = before[i].find(name);
+        if (was == before[i].end() || was->second == text) continue;
+        std::cout << opened[i].name << ": " << name << ": " << was->second << " -> " << text << '\n';
+        any = true;
+      }
+      if (!any) std::cout << opened[i].name << ": no change\n";
+      if (opened[i].created) std::filesystem::remove(opened[i].name);
+    }
+    std::cerr << "ovrameta: dry run: nothing was written" << std::endl;
+    return;
+  }
+  Progress progress(opened.size(), "files written");
+  reporter.SetProgress(&progress);
+  std::vector<Reporter> notes(opened.size(), Reporter::Buffered());
+  ForEachInOrder(
+      opened.size(), Jobs(),
+      [&](std::size_t i) {
+        OpenedFile& file = opened[i];
+        struct stat times {};
+        const bool timed = options.preserveTime && ::stat(file.name.c_str(), &times) == 0;
+        const std::string failure = file.batched->Flush();
+        // A format that is only read says so as it stands.
+        const bool readOnly = failure.rfind("can be read but not written", 0) == 0;
+        if (!failure.empty()) {
+          notes[i].Error(file.name, (readOnly ? "" : "cannot write file: ") + failure, kExitUsage);
+          if (file.created) std::filesystem::remove(file.name);
+        } else if (timed) {
+          const struct timespec kept[2] = {times.st_atim, times.st_mtim};
+          if (::utimensat(AT_FDCWD, file.name.c_str(), kept, 0) != 0)
+            notes[i].Error(file.name, std::string("cannot keep the modification time: ") + std::strerror(errno),
+                           kExitUsage);
+        }
+        notes[i].FlushLibrary(file.name);
+      },
+      [&](std::size_t i) {
+        if (notes[i].status() == kExitUsage) ++failed;
+        reporter.Relay(notes[i]);
+        progress.Step();
+      });
+  progress.Clear();
+  reporter.SetProgress(nullptr);
+}
+
+void PrintCount(std::size_t files, std::size_t failed, std::size_t unchanged) {
+  if (failed > 0 || files > 1 || unchanged > 0) {
+    const std::size_t written = files - failed - unchanged;
+    std::cerr << "ovrameta: " << written << (written == 1 ? " file" : " files") << " written, "
+              << (unchanged > 0 ? std::to_string(unchanged) + " unchanged, " : std::string()) << failed
+              << " not written" << std::endl;
+  }
+}
+
+// set --json FILE / --csv FILE: each file takes the values of its rows.
+int ImportCommand(const std::string& rowsFile, bool csv, const EditOptions& options) {
+  Reporter reporter;
+  std::vector<Row> rows;
+  std::string error;
+  if (!ReadRows(rowsFile, csv, rows, error)) {
+    reporter.Error(rowsFile, error, kExitUsage);
+    return reporter.status();
+  }
+  // Every value is checked before anything is written.
+  std::vector<std::string> files;
+  std::vector<std::vector<Edit>> edits;
+  std::set<std::string> undefined;
+  for (const Row& row : rows) {
+    std::vector<Edit> fileEdits;
+    for (const auto& [name, value] : row.cells) {
+      Edit edit;
+      if (!SchemaForPrefix(name.substr(0, name.find(':')))) {
+        undefined.insert(name.substr(0, name.find(':')));
+        continue;
+      }
+      if (!ParseEdit(name + "=" + value, false, edit, error)) {
+        reporter.Error(row.file, error, kExitUsage);
+        continue;
+      }
+      fileEdits.push_back(std::move(edit));
+    }
+    files.push_back(row.file);
+    edits.push_back(std::move(fileEdits));
+  }
+  for (const auto& prefix : undefined)
+    reporter.Error(rowsFile, "values with the prefix " + Quoted(prefix) + " are not imported (no definition)",
+                   kExitSuccess);
+  if (reporter.status() != kExitSuccess) {
+    std::cerr << "ovrameta: nothing was written" << std::endl;
+    return reporter.status();
+  }
+  std::vector<OpenedFile> opened = OpenForEdit(files, reporter);
+  std::size_t failed = files.size() - opened.size();
+  std::vector<std::map<std::string, std::string>> before;
+  std::vector<Edit> all;
+  std::vector<std::size_t> ok;
+  for (std::size_t i = 0, f = 0; i < files.size() && f < opened.size(); ++i) {
+    if (opened[f].given != files[i]) continue;
+    const std::vector<Edit>& fileEdits = edits[i];
+    all.insert(all.end(), fileEdits.begin(), fileEdits.end());
+    before.push_back(ReadNamed(opened[f], fileEdits));
+    MetaDataUpdateAccess update(opened[f].provider);
+    std::vector<Path> changes;
+    const bool done = ApplyEdits(*update, fileEdits, false, changes, reporter, opened[f].name);
+    if (done) {
+      for (const Path& path : changes) update.AddChange(path);
+      ok.push_back(f);
+    } else {
+      ++failed;
+    }
+    ++f;
+  }
+  std::vector<OpenedFile> toWrite;
+  std::vector<std::map<std::string, std::string>> toWriteBefore;
+  for (const std::size_t f : ok) {
+    toWrite.push_back(opened[f]);
+    toWriteBefore.push_back(before[f]);
+  }
+  std::size_t unchanged = 0;
+  WriteEdited(toWrite, options, reporter, failed, unchanged, toWriteBefore, all);
+  if (!options.dryRun) PrintCount(files.size(), failed, unchanged);
+  return reporter.status();
+}
+
+}  // namespace
+
+int SetCommand(const std::vector<std::string>& arguments, const EditOptions& options) {
+  if (!options.importFile.empty()) {
+    if (!arguments.empty()) {
+      Reporter reporter;
+      reporter.Error("", "set --json/--csv FILE takes the files and values from FILE only", kExitUsage);
+      return reporter.status();
+    }
+    return ImportCommand(options.importFile, options.importCSV, options);
+  }
   Reporter reporter;
   std::vector<std::string> files;
   std::vector<std::string> assignmentTexts;
@@ -636,48 +1032,34 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
     reporter.Error("", "set: no file given", kExitUsage);
     return reporter.status();
   }
-  if (assignmentTexts.empty() && deletes.empty()) {
-    reporter.Error("", "set: nothing to do (give NAME=VALUE or --delete NAME)", kExitUsage);
+  if (assignmentTexts.empty() && options.deletes.empty()) {
+    reporter.Error("", "set: nothing to do (give NAME=VALUE, NAME+=ITEM, NAME-=ITEM or --delete NAME)",
+                   kExitUsage);
     return reporter.status();
   }
 
   // Everything is checked before anything is written.
-  std::vector<Assignment> assignments;
+  std::vector<Edit> edits;
   for (const auto& text : assignmentTexts) {
-    const auto equals = text.find('=');
-    if (equals == std::string::npos) {
-      reporter.Error("", Quoted(text) + ": expected NAME=VALUE", kExitUsage);
-      continue;
-    }
-    Assignment assignment;
+    Edit edit;
     std::string error;
-    if (!ResolveName(text.substr(0, equals), assignment.name, error)) {
-      reporter.Error("", error, kExitUsage);
-      continue;
+    if (ParseEdit(text, options.noSplit, edit, error)) {
+      edits.push_back(std::move(edit));
+    } else {
+      reporter.Error(error.find(": refused: ") != std::string::npos ? FileList(files) : "", error, kExitUsage);
     }
-    assignment.value = text.substr(equals + 1);
-    const std::string reason =
-        CheckValue(assignment.name.path, *assignment.name.entry, assignment.value);
-    if (!reason.empty()) {
-      reporter.Error(FileList(files), assignment.name.name + ": refused: " + reason, kExitUsage);
-      continue;
-    }
-    assignments.push_back(assignment);
   }
-  std::vector<ResolvedName> deletions;
-  for (const auto& text : deletes) {
-    ResolvedName name;
+  for (const auto& text : options.deletes) {
+    Edit edit;
+    edit.kind = Edit::kDelete;
     std::string error;
-    if (!ResolveName(text, name, error)) {
+    if (!ResolveName(text, edit.name, error)) {
       reporter.Error("", error, kExitUsage);
-      continue;
+    } else if (!edit.name.language.empty()) {
+      reporter.Error("", Quoted(text) + ": --delete removes a whole property, not one language", kExitUsage);
+    } else {
+      edits.push_back(std::move(edit));
     }
-    if (!name.language.empty()) {
-      reporter.Error("", Quoted(text) + ": --delete removes a whole property, not one language",
-                     kExitUsage);
-      continue;
-    }
-    deletions.push_back(name);
   }
   if (reporter.status() != kExitSuccess) {
     std::cerr << "ovrameta: nothing was written" << std::endl;
@@ -686,124 +1068,143 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
 
   // A file that cannot be read is named and left out; the others are
   // written all the same.
-  Progress progress(files.size(), "files read");
-  reporter.SetProgress(&progress);
-  std::vector<OpenedFile> opened;
-  {
-    std::vector<std::pair<OpenedFile, Reporter>> read(files.size(),
-                                                     {OpenedFile(), Reporter::Buffered()});
-    ForEachInOrder(
-        files.size(), Jobs(),
-        [&](std::size_t i) { OpenFile(files[i], read[i].second, read[i].first, true); },
-        [&](std::size_t i) {
-          reporter.Relay(read[i].second);
-          if (read[i].first.provider) opened.push_back(std::move(read[i].first));
-          progress.Step();
-        });
-  }
-  progress.Clear();
-  reporter.SetProgress(nullptr);
+  std::vector<OpenedFile> opened = OpenForEdit(files, reporter);
   if (opened.empty()) {
     std::cerr << "ovrameta: nothing was written" << std::endl;
     return reporter.status();
   }
-  for (auto& file : opened) {
-    // A file without XMP starts from an empty packet, so that it can take
-    // the new values.
-    if (!file.provider->MetaDataAccess()) file.provider->ResetToEmptyMetaData(false);
-  }
+  std::vector<std::map<std::string, std::string>> before;
+  if (options.dryRun)
+    for (const auto& file : opened) before.push_back(ReadNamed(file, edits));
 
-  boost::shared_ptr<MetaDataProvider> target;
   std::vector<std::string> names;
   for (const auto& file : opened) names.push_back(file.name);
   const std::string context = FileList(names);
-  if (opened.size() == 1) {
-    target = opened.front().provider;
-  } else {
-    auto aggregate = boost::make_shared<AggregateProvider>();
-    for (const auto& file : opened) aggregate->AddProvider(file.provider, false);
-    aggregate->OnProxyMetaDataChange(nullptr);
-    target = aggregate;
-  }
   {
-    MetaDataUpdateAccess update(target);
-    XMPMetaRef xmp = *update;
-    if (!xmp) {
-      reporter.Error(context, "no metadata could be read; nothing was written", kExitUsage);
-      return reporter.status();
+    boost::shared_ptr<MetaDataProvider> target = opened.front().provider;
+    if (opened.size() > 1) {
+      auto aggregate = boost::make_shared<AggregateProvider>();
+      for (const auto& file : opened) aggregate->AddProvider(file.provider, false);
+      aggregate->OnProxyMetaDataChange(nullptr);
+      target = aggregate;
     }
     // Every value must go in before any file is written: a change is only
     // recorded (and so written) when all of them did.
-    const int before = reporter.status();
+    MetaDataUpdateAccess update(target);
     std::vector<Path> changes;
-    for (const auto& assignment : assignments) {
-      const std::string missing = MissingArrayItem(xmp, assignment.name.name);
-      if (!missing.empty()) {
-        reporter.Error(context, assignment.name.name + ": " + missing + " does not exist", kExitUsage);
-        continue;
-      }
-      // The library reports a value it could not write, or that did not
-      // read back as written; a value already there is not written again.
-      const std::size_t reports = GetErrorInfos().size();
-      const auto& name = assignment.name;
-      const bool written = name.language.empty()
-                               ? SetValue(xmp, name.path, assignment.value)
-                               : SetAltTextValue(xmp, name.path, name.language, assignment.value);
-      if (written) changes.push_back(name.path);
-      if (GetErrorInfos().size() != reports) {
-        reporter.Error(context, assignment.name.name + ": the value could not be written", kExitUsage);
-      }
-    }
-    for (const auto& name : deletions) {
-      if (DeleteValue(xmp, name.path)) {
-        changes.push_back(name.path);
-      } else {
-        reporter.Error(context, name.name + ": no value to delete", kExitAbsent);
-      }
-    }
-    reporter.FlushLibrary(context);
-    if (reporter.status() != before) {
+    if (!*update || !ApplyEdits(*update, edits, false, changes, reporter, context)) {
+      if (!*update) reporter.Error(context, "no metadata could be read", kExitUsage);
+      for (const auto& file : opened)
+        if (file.created) std::filesystem::remove(file.name);
       std::cerr << "ovrameta: nothing was written" << std::endl;
       return reporter.status();
     }
     for (const Path& path : changes) update.AddChange(path);
   }
+  // Items are added and removed file by file: each file's list decides.
+  for (auto& file : opened) {
+    MetaDataUpdateAccess update(file.provider);
+    std::vector<Path> changes;
+    ApplyEdits(*update, edits, true, changes, reporter, file.name);
+    for (const Path& path : changes) update.AddChange(path);
+  }
   reporter.FlushLibrary(context);
-  target.reset();
 
-  // The edit is complete in every file's packet: the files are written side
-  // by side.
-  Progress progressWritten(opened.size(), "files written");
-  reporter.SetProgress(&progressWritten);
-  std::vector<Reporter> notes(opened.size(), Reporter::Buffered());
-  std::size_t failed = files.size() - opened.size();
-  ForEachInOrder(
-      opened.size(), Jobs(),
-      [&](std::size_t i) {
-        const std::string failure = opened[i].batched->Flush();
-        // A format that is only read says so as it stands.
-        const bool readOnly = failure.rfind("can be read but not written", 0) == 0;
-        if (!failure.empty())
-          notes[i].Error(opened[i].name, (readOnly ? "" : "cannot write file: ") + failure, kExitUsage);
-        notes[i].FlushLibrary(opened[i].name);
-      },
-      [&](std::size_t i) {
-        if (notes[i].status() == kExitUsage) ++failed;
-        reporter.Relay(notes[i]);
-        progressWritten.Step();
-      });
-  progressWritten.Clear();
-  reporter.SetProgress(nullptr);
+  std::size_t failed = files.size() - opened.size(), unchanged = 0;
+  WriteEdited(opened, options, reporter, failed, unchanged, before, edits);
+  if (options.dryRun) return reporter.status();
   if (failed < files.size()) {
     std::vector<std::pair<std::string, std::string>> recent;
-    for (const auto& assignment : assignments) recent.emplace_back(assignment.name.name, assignment.value);
+    for (const auto& edit : edits)
+      if (edit.kind == Edit::kSet) recent.emplace_back(edit.name.name, edit.value);
     RecordRecentValues(recent);
   }
-  if (failed > 0 || files.size() > 1) {
-    const std::size_t written = files.size() - failed;
-    std::cerr << "ovrameta: " << written << (written == 1 ? " file" : " files") << " written, " << failed
-              << " not written" << std::endl;
+  PrintCount(files.size(), failed, unchanged);
+  return reporter.status();
+}
+
+// ---------------------------------------------------------------------------
+// copy
+
+int CopyCommand(const std::vector<std::string>& arguments, const EditOptions& options) {
+  Reporter reporter;
+  std::vector<std::string> files, nameTexts;
+  SplitArguments(arguments, files, nameTexts);
+  if (files.size() < 2) {
+    reporter.Error("", "copy: give the file to copy from, then the files to copy to", kExitUsage);
+    return reporter.status();
   }
+  std::vector<Path> paths;
+  for (const auto& text : nameTexts) {
+    ResolvedName name;
+    std::string error;
+    if (!ResolveName(text, name, error) || !name.language.empty()) {
+      reporter.Error("", error.empty() ? Quoted(text) + ": copy takes whole properties" : error, kExitUsage);
+      continue;
+    }
+    paths.push_back(name.path);
+  }
+  if (reporter.status() != kExitSuccess) return reporter.status();
+  OpenedFile source;
+  if (!OpenFile(files.front(), reporter, source)) return reporter.status();
+  reporter.FlushLibrary(files.front());
+  {
+    MetaDataReadAccess reader(source.provider);
+    if (!*reader) {
+      reporter.Error(files.front(), "no XMP to copy", kExitAbsent);
+      return reporter.status();
+    }
+    if (nameTexts.empty()) {
+      // Everything but the identity and history of the source document.
+      for (const StoredNamespace& ns : GetStoredNamespaces(*reader)) {
+        if (ns.namespaceURI == "http://ns.adobe.com/xap/1.0/mm/") continue;
+        for (const StoredNode& node : GetStoredNodes(*reader, ns.namespaceURI)) {
+          Path path;
+          path.namespaceURI = ns.namespaceURI;
+          path.description = node.name;
+          path.entry_name = node.name.substr(node.name.find(':') + 1);
+          path.parent_id = ns.namespaceURI;
+          paths.push_back(path);
+        }
+      }
+    }
+  }
+  const std::vector<std::string> targets(files.begin() + 1, files.end());
+  std::vector<OpenedFile> opened = OpenForEdit(targets, reporter);
+  if (opened.empty()) return reporter.status();
+  std::vector<std::string> names;
+  for (const auto& file : opened) names.push_back(file.name);
+  {
+    boost::shared_ptr<MetaDataProvider> target = opened.front().provider;
+    if (opened.size() > 1) {
+      auto aggregate = boost::make_shared<AggregateProvider>();
+      for (const auto& file : opened) aggregate->AddProvider(file.provider, false);
+      aggregate->OnProxyMetaDataChange(nullptr);
+      target = aggregate;
+    }
+    MetaDataReadAccess reader(source.provider);
+    MetaDataUpdateAccess update(target);
+    const std::size_t reports = GetErrorInfos().size();
+    const std::vector<Path> changes = CopyValues(*reader, *update, paths);
+    if (GetErrorInfos().size() != reports) {
+      reporter.FlushLibrary(FileList(names));
+      reporter.Error(FileList(names), "not every value could be copied", kExitUsage);
+      std::cerr << "ovrameta: nothing was written" << std::endl;
+      return reporter.status();
+    }
+    if (options.dryRun) {
+      for (const Path& path : changes) std::cout << FileList(names) << ": " << path.description << " would be copied\n";
+      if (changes.empty()) std::cout << FileList(names) << ": no change\n";
+      for (const auto& file : opened)
+        if (file.created) std::filesystem::remove(file.name);
+      std::cerr << "ovrameta: dry run: nothing was written" << std::endl;
+      return reporter.status();
+    }
+    for (const Path& path : changes) update.AddChange(path);
+  }
+  std::size_t failed = targets.size() - opened.size(), unchanged = 0;
+  WriteEdited(opened, options, reporter, failed, unchanged, {}, {});
+  PrintCount(targets.size(), failed, unchanged);
   return reporter.status();
 }
 
@@ -939,6 +1340,11 @@ int ViewsCommand(const std::string& name) {
 
 // ---------------------------------------------------------------------------
 // packages
+
+void SetSidecarOptions(bool always, bool fullName) {
+  Sidecars().always = always;
+  Sidecars().name = fullName ? SidecarName::kFull : SidecarName::kBase;
+}
 
 int PackagesCommand(const std::vector<ErrorInfo>& problems) {
   const std::vector<ExtensionPackage> packages = RegisteredExtensionPackages();

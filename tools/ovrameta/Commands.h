@@ -18,6 +18,7 @@ enum ExitStatus {
 struct GetOptions {
   bool raw = false;
   bool json = false;
+  bool csv = false;
 };
 
 // viewName: show that view only; fieldList: only the fields of that path
@@ -26,8 +27,20 @@ int ShowCommand(const std::vector<std::string>& files, bool each, const std::str
                 const std::string& fieldList);
 // arguments: files and names in any order (see SplitArguments).
 int GetCommand(const std::vector<std::string>& arguments, const GetOptions& options);
-// arguments: files and NAME=VALUE assignments in any order.
-int SetCommand(const std::vector<std::string>& arguments, const std::vector<std::string>& deletes);
+struct EditOptions {
+  std::vector<std::string> deletes;
+  bool dryRun = false;        // print what would change, write nothing
+  bool noSplit = false;       // a list value is one item, ";" and all
+  bool preserveTime = false;  // keep each file's modification time
+  std::string importFile;     // set --json FILE / --csv FILE
+  bool importCSV = false;
+};
+
+// arguments: files and NAME=VALUE, NAME+=ITEM, NAME-=ITEM in any order.
+int SetCommand(const std::vector<std::string>& arguments, const EditOptions& options);
+// arguments: the file to copy from, the files to copy to, and the names of
+// the properties to copy (every property when none is named).
+int CopyCommand(const std::vector<std::string>& arguments, const EditOptions& options);
 // prefixes: only those schemas (all when empty); xml: as a definitions file.
 int SchemasCommand(const std::vector<std::string>& prefixes, bool xml);
 // arguments: the view's name, then the prefixes of the schemas it shows.
@@ -36,6 +49,9 @@ int GenerateViewCommand(const std::vector<std::string>& arguments);
 int ViewsCommand(const std::string& name);
 // The registered extension packages and the problems found registering them.
 int PackagesCommand(const std::vector<ovrametadata::ErrorInfo>& problems);
+
+// Where each file's metadata is read from and written to (see Sidecars.h).
+void SetSidecarOptions(bool always, bool fullName);
 
 // Brings the library up for the lifetime of the object and relays the
 // problems it reports to standard error.

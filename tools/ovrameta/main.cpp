@@ -42,6 +42,13 @@ int main(int argc, char** argv) {
   app.add_option("-j,--jobs", jobs,
                  "Files worked on at the same time (default: one per core, at most 8)")
       ->check(CLI::Range(1u, ovrameta::kMaxJobs));
+  bool sidecar = false;
+  std::string sidecarName = "base";
+  app.add_flag("--sidecar", sidecar,
+               "Read and write the XMP sidecar beside each file (made when missing); camera raw files always "
+               "take their edits there");
+  app.add_option("--sidecar-name", sidecarName, "The name of a new sidecar: base (photo.xmp) or full (photo.cr3.xmp)")
+      ->check(CLI::IsMember({"base", "full"}));
   app.footer(
       "Names are prefix:Property, prefix:Struct/prefix:Field or prefix:Array[n].\n"
       "Exit status: 0 success, 1 a named value is absent, 2 usage error or a file that cannot\n"
@@ -65,12 +72,26 @@ int main(int argc, char** argv) {
   get->add_flag("--raw", getOptions.raw, "The stored text instead of the display value");
   get->add_flag("--json", getOptions.json,
                 "Machine-readable output with types (all properties when no NAME is given)");
+  get->add_flag("--csv", getOptions.csv,
+                "One CSV row per file of stored values (all properties when no NAME is given), for set --csv");
 
   std::vector<std::string> setArguments;
-  std::vector<std::string> deletes;
+  ovrameta::EditOptions editOptions;
+  std::string importJson, importCsv;
   auto* set = app.add_subcommand("set", "Write values, checked against the definitions");
-  set->add_option("ARGS", setArguments, "FILE... NAME=VALUE...")->required();
-  set->add_option("--delete", deletes, "Delete the value of NAME")->expected(1, -1);
+  set->add_option("ARGS", setArguments, "FILE... NAME=VALUE... (NAME+=ITEM, NAME-=ITEM for lists)");
+  set->add_option("--delete", editOptions.deletes, "Delete the value of NAME")->expected(1, -1);
+  set->add_option("--json", importJson, "Apply the values of a JSON file (as get --json writes) to the files it names");
+  set->add_option("--csv", importCsv, "Apply the rows of a CSV file (as get --csv writes) to the files they name");
+  set->add_flag("--no-split", editOptions.noSplit, "A list value is one item, even with \"; \" in it");
+  set->add_flag("--dry-run", editOptions.dryRun, "Print per file what would change; write nothing");
+
+  std::vector<std::string> copyArguments;
+  auto* copy = app.add_subcommand("copy", "Copy the XMP of one file, or the named properties, to other files");
+  copy->add_option("ARGS", copyArguments, "SOURCE TARGET... [NAME...]")->required();
+  copy->add_flag("--dry-run", editOptions.dryRun, "Print what would be copied; write nothing");
+  for (auto* editing : {set, copy})
+    editing->add_flag("-P,--preserve-time", editOptions.preserveTime, "Keep each file's modification time");
 
   std::vector<std::string> schemaPrefixes;
   bool schemasXml = false;
@@ -107,6 +128,11 @@ int main(int argc, char** argv) {
   }
 
   if (jobs != 0) ovrameta::SetJobs(jobs);
+  ovrameta::SetSidecarOptions(sidecar, sidecarName == "full");
+  if (!importJson.empty() || !importCsv.empty()) {
+    editOptions.importFile = importJson.empty() ? importCsv : importJson;
+    editOptions.importCSV = importJson.empty();
+  }
   ovrameta::Session session;
   if (!session.ok()) return ovrameta::kExitUsage;
   // Packages may bring schemas, so every command loads them.
@@ -118,7 +144,8 @@ int main(int argc, char** argv) {
   if (*views && !generatePrefixes.empty()) return ovrameta::GenerateViewCommand(generatePrefixes);
   if (*views) return ovrameta::ViewsCommand(viewsName);
   if (*get) return ovrameta::GetCommand(getArguments, getOptions);
-  if (*set) return ovrameta::SetCommand(setArguments, deletes);
+  if (*set) return ovrameta::SetCommand(setArguments, editOptions);
+  if (*copy) return ovrameta::CopyCommand(copyArguments, editOptions);
   if (*schemas) return ovrameta::SchemasCommand(schemaPrefixes, schemasXml);
   return ovrameta::kExitUsage;
 }
