@@ -125,7 +125,7 @@ TEST_F(CorpusTest, EveryValueExifToolReadsIsReadTheSame) {
   RunCommand("LC_ALL=C exiftool -q -overwrite_original -all= " + Quote((mDir / "plain.jpg").string()));
   jpeg = ReadFile(mDir / "plain.jpg");
   const std::string gif("GIF89a\x01\0\x01\0\x80\0\0\0\0\0\xff\xff\xff,\0\0\0\0\x01\0\x01\0\0\x02\x02\x44\x01\0;", 35);
-  const std::string eps = "%!PS-Adobe-3.0 EPSF-3.0\n%%BoundingBox: 0 0 1 1\n%%EndComments\nshowpage\n%%EOF\n";
+  const std::string eps = "%!PS-3.0 EPSF-3.0\n%%BoundingBox: 0 0 1 1\n%%EndComments\nshowpage\n%%EOF\n";
   Make("languages.jpg", jpeg,
        "-EXIF:Artist=Camera -XMP-dc:Title=Harbour -XMP-dc:Title-en=Harbour -XMP-dc:Title-fr=Port "
        "-XMP-dc:Title-de=Hafen -XMP-dc:Title-es=Puerto -XMP-dc:Description=Boats -XMP-dc:Description-de=Boote "
@@ -137,7 +137,7 @@ TEST_F(CorpusTest, EveryValueExifToolReadsIsReadTheSame) {
        "'-XMP-mwg-kw:KeywordInfo={Hierarchy=[{Keyword=Places,Children=[{Keyword=Harbour}]}]}' "
        "-XMP-iptcExt:PersonInImage=Ann -XMP-iptcCore:CountryCode=NO");
   Make("picture.gif", gif, "-XMP-dc:Title=Gif -XMP-xmp:Label=Red");
-  Make("scanned.eps", eps, "-XMP-dc:Title=Eps -XMP-xmp:Label=Blue");
+  Make("scanned.eps", eps, "-m -XMP-dc:Title=Eps -XMP-xmp:Label=Blue");
   Make("scanned.svg", kSvg, "");
   Make("darktable.xmp", kSidecar, "");
   const std::vector<std::string> files = {"languages.jpg", "regions.jpg", "picture.gif",

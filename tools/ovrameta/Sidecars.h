@@ -7,7 +7,7 @@
 namespace ovrameta {
 
 enum class SidecarName {
-  kBase,  // "photo.xmp": what raw converters from Adobe write and read
+  kBase,  // "photo.xmp": what most raw converters write and read
   kFull,  // "photo.cr3.xmp": one sidecar per file even where names share a stem
 };
 

@@ -8,6 +8,7 @@
 #include <ovraxmp/XMPMeta.h>
 #include <ovraxmp/XMPUtils.h>
 
+#include "ToolkitOutput.h"
 #include "XMPNodeTree.h"
 #include "XMPPacket.h"
 #include "files/PacketScan.h"
@@ -349,6 +350,9 @@ bool Serialize(XmpPtr xmp, std::string* out, XMP_OptionBits options, std::uint32
                const std::string& newline, const std::string& indent, std::int32_t baseIndent) {
   const std::vector<TwoItemAlternative> alternatives = TwoItemAlternatives(xmp);
   XmpString text;
+  // A packet that does not fit its length is an error the caller gets; the
+  // toolkit's own text about it is not for the terminal.
+  const ToolkitOutput quiet;
   const bool ok = (newline.empty() && indent.empty() && baseIndent == 0)
                       ? xmp_serialize(xmp, text, options, padding)
                       : xmp_serialize_and_format(xmp, text, options, padding, newline.c_str(), indent.c_str(),
