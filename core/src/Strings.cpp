@@ -168,17 +168,36 @@ void AppendCodePoint(UTF8String& out, char32_t cp) {
 }
 
 UTF8String ToUTF8(std::u16string_view utf16) {
-  UTF8String out;
-  out.reserve(utf16.size() + utf16.size() / 2);
+  // At most three bytes per code unit, so the result is written in place;
+  // ASCII takes one test.
+  UTF8String out(utf16.size() * 3, '\0');
+  char* next = out.data();
   for (std::size_t i = 0; i < utf16.size(); ++i) {
     char32_t c = utf16[i];
+    if (c < 0x80) {
+      *next++ = static_cast<char>(c);
+      continue;
+    }
     if (c >= 0xD800 && c <= 0xDBFF && i + 1 < utf16.size() && utf16[i + 1] >= 0xDC00 &&
         utf16[i + 1] <= 0xDFFF) {
       c = 0x10000 + ((c - 0xD800) << 10) + (utf16[i + 1] - 0xDC00);
       ++i;
     }
-    AppendCodePoint(out, c);  // a lone surrogate becomes U+FFFD here
+    if (IsSurrogate(c)) c = kReplacement;  // a lone surrogate
+    if (c < 0x800) {
+      *next++ = static_cast<char>(0xC0 | (c >> 6));
+    } else if (c < 0x10000) {
+      *next++ = static_cast<char>(0xE0 | (c >> 12));
+      *next++ = static_cast<char>(0x80 | ((c >> 6) & 0x3F));
+    } else {
+      // Two code units made these four bytes.
+      *next++ = static_cast<char>(0xF0 | (c >> 18));
+      *next++ = static_cast<char>(0x80 | ((c >> 12) & 0x3F));
+      *next++ = static_cast<char>(0x80 | ((c >> 6) & 0x3F));
+    }
+    *next++ = static_cast<char>(0x80 | (c & 0x3F));
   }
+  out.resize(static_cast<std::size_t>(next - out.data()));
   return out;
 }
 
