@@ -140,7 +140,7 @@ void BM_CatenateArrayItems(benchmark::State& state) {
   for (int i = 0; i < 20; ++i) meta.AppendArrayItem(kNS, "Keywords", kXMP_PropValueIsArray, "keyword " + std::to_string(i));
   std::string text;
   for (auto _ : state) {
-    XMPUtils::CatenateArrayItems(meta, kNS, "Keywords", "; ", "\"", 0, &text);
+    text = XMPUtils::CatenateArrayItems(meta, kNS, "Keywords", "; ", "\"", 0);
     benchmark::DoNotOptimize(text);
   }
 }

@@ -86,7 +86,7 @@ icu::DateFormat* MediumFormatter(const UTF8String& language, bool withDate, bool
 UTF8String FormatDate(const UTF8String& value) {
   XMP_DateTime dt;
   try {
-    ovraxmp::XMPUtils::ConvertToDate(value, &dt);
+    dt = ovraxmp::XMPUtils::ConvertToDate(value);
   } catch (...) {
     // Unreadable dates are shown raw by the caller.
     return UTF8String();
@@ -94,7 +94,7 @@ UTF8String FormatDate(const UTF8String& value) {
   if (dt.tzHour == 0 && dt.tzMinute == 0) dt.tzSign = ovraxmp::kXMP_TimeIsUTC;
   if (!IsValidDateTime(dt)) return UTF8String();
   try {
-    ovraxmp::XMPUtils::ConvertToUTCTime(&dt);
+    dt = ovraxmp::XMPUtils::ConvertToUTCTime(dt);
   } catch (...) {
     return UTF8String();
   }

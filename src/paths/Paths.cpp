@@ -33,8 +33,8 @@ bool IsBagOrSeq(const boost::optional<PrimitiveType>& type) {
 UTF8String ComposeStructField(const Path& parent, const UTF8String& fieldNS,
                               const UTF8String& fieldName) {
   std::string composed;
-  ovraxmp::XMPUtils::ComposeStructFieldPath(parent.namespaceURI, parent.description, fieldNS,
-                                            fieldName, &composed);
+  composed = ovraxmp::XMPUtils::ComposeStructFieldPath(parent.namespaceURI, parent.description, fieldNS,
+                                            fieldName);
   return composed;
 }
 
@@ -132,8 +132,8 @@ Path CreatePathFromQualifier(const Path& parent,
   std::string composed;
   // Deliberately not caught: a qualifier that cannot be addressed is the
   // caller's error, unlike a structure field.
-  ovraxmp::XMPUtils::ComposeQualifierPath(parent.namespaceURI, parent.description, qualifierNS,
-                                          qualifier->name, &composed);
+  composed = ovraxmp::XMPUtils::ComposeQualifierPath(parent.namespaceURI, parent.description, qualifierNS,
+                                          qualifier->name);
   return MakePath(parent.internal, parent.namespaceURI, std::move(composed), qualifier->name,
                   *entry->type);
 }
@@ -143,9 +143,8 @@ Path CreatePathFromArrayItem(const Path& arrayPath, int index) {
   if (!entry) return Path();
   const auto elementType = ElementTypeIdOf(*entry);
   if (!elementType) return Path();
-  std::string composed;
-  ovraxmp::XMPUtils::ComposeArrayItemPath(arrayPath.namespaceURI, arrayPath.description, index,
-                                          &composed);
+  const std::string composed =
+      ovraxmp::XMPUtils::ComposeArrayItemPath(arrayPath.namespaceURI, arrayPath.description, index);
   UTF8String parentId;
   if (const auto type = detail::TypeOfEntry(arrayPath, *entry)) {
     if (const auto primitive = PrimitiveTypeOf(*type)) {

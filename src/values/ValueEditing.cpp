@@ -126,8 +126,8 @@ void MarkMultiValueDeleted(XMPMetaRef xmp, const Path& path) {
     meta.AppendArrayItem(transient, kDeletedProperties, ovraxmp::kXMP_PropArrayIsUnordered,
                          std::string(), ovraxmp::kXMP_PropValueIsStruct);
     std::string itemPath;
-    ovraxmp::XMPUtils::ComposeArrayItemPath(transient, kDeletedProperties,
-                                            ovraxmp::kXMP_ArrayLastItem, &itemPath);
+    itemPath = ovraxmp::XMPUtils::ComposeArrayItemPath(transient, kDeletedProperties,
+                                            ovraxmp::kXMP_ArrayLastItem);
     meta.SetStructField(transient, itemPath, transient, kDelURI, path.namespaceURI);
     std::string prefix;
     if (!ovraxmp::XMPMeta::GetNamespacePrefix(path.namespaceURI, &prefix)) {

@@ -72,8 +72,8 @@ struct ArrayText {
     return ordered ? ovraxmp::kXMP_PropArrayIsOrdered : ovraxmp::kXMP_NoOptions;
   }
   bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
-    XMPUtils::CatenateArrayItems(meta, path.namespaceURI, path.description, kArraySeparator,
-                                 kArrayQuotes, Options(), &out);
+    out = XMPUtils::CatenateArrayItems(meta, path.namespaceURI, path.description, kArraySeparator,
+                                 kArrayQuotes, Options());
     return true;
   }
   void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
@@ -169,13 +169,13 @@ struct DateText {
     std::string stored;
     if (!meta.GetProperty(path.namespaceURI, path.description, &stored)) return false;
     ovraxmp::XMP_DateTime dateTime;
-    XMPUtils::ConvertToDate(stored, &dateTime);
-    XMPUtils::ConvertFromDate(dateTime, &out);
+    dateTime = XMPUtils::ConvertToDate(stored);
+    out = XMPUtils::ConvertFromDate(dateTime);
     return true;
   }
   void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
     ovraxmp::XMP_DateTime dateTime;
-    XMPUtils::ConvertToDate(value, &dateTime);
+    dateTime = XMPUtils::ConvertToDate(value);
     meta.SetProperty_Date(path.namespaceURI, path.description, dateTime);
   }
 };
@@ -232,8 +232,8 @@ struct DateValue {
     std::string stored;
     if (!meta.GetProperty(path.namespaceURI, path.description, &stored)) return false;
     ovraxmp::XMP_DateTime dateTime;
-    XMPUtils::ConvertToDate(stored, &dateTime);
-    XMPUtils::ConvertToUTCTime(&dateTime);
+    dateTime = XMPUtils::ConvertToDate(stored);
+    dateTime = XMPUtils::ConvertToUTCTime(dateTime);
     out.year = dateTime.year;
     out.month = dateTime.month;
     out.day = dateTime.day;
@@ -381,7 +381,7 @@ bool IsValidIntegerText(XMPMetaRef xmp, const Path& path, const UTF8String& text
   long long value = 0;
   if (!ReadValue(xmp, path, value, nullptr, Int64Value())) return true;
   std::string canonical;
-  XMPUtils::ConvertFromInt64(value, &canonical);
+  canonical = XMPUtils::ConvertFromInt64(value);
   return canonical == text;
 }
 
@@ -520,8 +520,8 @@ bool SetValue(XMPMetaRef xmp, const Path& path, const UTF8String& value) {
     UTF8String normal;
     try {
       ovraxmp::XMP_DateTime dateTime;
-      XMPUtils::ConvertToDate(value, &dateTime);
-      XMPUtils::ConvertFromDate(dateTime, &normal);
+      dateTime = XMPUtils::ConvertToDate(value);
+      normal = XMPUtils::ConvertFromDate(dateTime);
     } catch (const std::exception&) {
       ReportInvalidData(kErrorWritingXMP, path);
       return false;

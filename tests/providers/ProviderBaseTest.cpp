@@ -24,8 +24,8 @@ std::string LastChangedParts(const std::string& bytes) {
   ovraxmp::XMPMeta meta;
   meta.ParseFromBuffer(bytes);
   std::string item;
-  ovraxmp::XMPUtils::ComposeArrayItemPath(ovraxmp::kXMP_NS_XMP_MM, "History",
-                                          ovraxmp::kXMP_ArrayLastItem, &item);
+  item = ovraxmp::XMPUtils::ComposeArrayItemPath(ovraxmp::kXMP_NS_XMP_MM, "History",
+                                          ovraxmp::kXMP_ArrayLastItem);
   std::string changed;
   meta.GetStructField(ovraxmp::kXMP_NS_XMP_MM, item, ovraxmp::kXMP_NS_XMP_ResourceEvent, "changed",
                       &changed);

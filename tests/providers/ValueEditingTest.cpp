@@ -61,7 +61,7 @@ std::vector<std::pair<std::string, std::string>> DeletionRecords(const ovraxmp::
   const int count = meta.CountArrayItems(kTransient, "DeletedProperties");
   for (int i = 1; i <= count; ++i) {
     std::string item, uri, path;
-    ovraxmp::XMPUtils::ComposeArrayItemPath(kTransient, "DeletedProperties", i, &item);
+    item = ovraxmp::XMPUtils::ComposeArrayItemPath(kTransient, "DeletedProperties", i);
     meta.GetStructField(kTransient, item, kTransient, "DelURI", &uri);
     meta.GetStructField(kTransient, item, kTransient, "DelPath", &path);
     records.emplace_back(uri, path);

@@ -12,9 +12,9 @@ namespace {
 
 std::string RoundTrip(const std::string& text) {
   XMP_DateTime date;
-  XMPUtils::ConvertToDate(text, &date);
+  date = XMPUtils::ConvertToDate(text);
   std::string back;
-  XMPUtils::ConvertFromDate(date, &back);
+  back = XMPUtils::ConvertFromDate(date);
   return back;
 }
 
@@ -35,20 +35,20 @@ TEST(XMPConversions, EveryIsoFormXmpAllowsRoundTrips) {
 
 TEST(XMPConversions, DateFieldsAndFlags) {
   XMP_DateTime d;
-  XMPUtils::ConvertToDate("2024-03", &d);
+  d = XMPUtils::ConvertToDate("2024-03");
   EXPECT_TRUE(d.hasDate);
   EXPECT_FALSE(d.hasTime);
   EXPECT_EQ(d.year, 2024);
   EXPECT_EQ(d.month, 3);
   EXPECT_EQ(d.day, 0);
-  XMPUtils::ConvertToDate("2024-03-05T23:59:58.000000001-08:30", &d);
+  d = XMPUtils::ConvertToDate("2024-03-05T23:59:58.000000001-08:30");
   EXPECT_TRUE(d.hasTime);
   EXPECT_TRUE(d.hasTimeZone);
   EXPECT_EQ(d.tzSign, -1);
   EXPECT_EQ(d.tzHour, 8);
   EXPECT_EQ(d.tzMinute, 30);
   EXPECT_EQ(d.nanoSecond, 1);
-  XMPUtils::ConvertToDate("2024-03-05T10:00", &d);
+  d = XMPUtils::ConvertToDate("2024-03-05T10:00");
   EXPECT_FALSE(d.hasTimeZone);
 }
 
@@ -58,7 +58,7 @@ TEST(XMPConversions, MalformedDatesRaiseBadValue) {
                            "2024-03-05T10:00+25:00", "2024-03-05T10:00Zjunk", "2024/03/05", "2024-3-5",
                            "2024-03-05T10:00:00."}) {
     XMP_DateTime d;
-    EXPECT_EQ(xmptest::ErrorIdOf([&] { XMPUtils::ConvertToDate(text, &d); }), kXMPErr_BadValue) << text;
+    EXPECT_EQ(xmptest::ErrorIdOf([&] { d = XMPUtils::ConvertToDate(text); }), kXMPErr_BadValue) << text;
   }
 }
 
@@ -68,26 +68,26 @@ TEST(XMPConversions, UtcConversionCarriesAcrossDaysMonthsAndYears) {
                                                        {"2024-03-05", "2024-03-05"}};  // no time: unchanged
   for (const auto& [local, utc] : cases) {
     XMP_DateTime d;
-    XMPUtils::ConvertToDate(local, &d);
-    XMPUtils::ConvertToUTCTime(&d);
+    d = XMPUtils::ConvertToDate(local);
+    d = XMPUtils::ConvertToUTCTime(d);
     std::string text;
-    XMPUtils::ConvertFromDate(d, &text);
+    text = XMPUtils::ConvertFromDate(d);
     EXPECT_EQ(text, utc) << local;
   }
 }
 
 TEST(XMPConversions, LocalTimeAndNowCarryAZone) {
   XMP_DateTime d;
-  XMPUtils::ConvertToDate("2024-06-15T12:00:00Z", &d);
+  d = XMPUtils::ConvertToDate("2024-06-15T12:00:00Z");
   XMP_DateTime local = d;
-  XMPUtils::ConvertToLocalTime(&local);
+  local = XMPUtils::ConvertToLocalTime(local);
   EXPECT_TRUE(local.hasTimeZone);
-  XMPUtils::ConvertToUTCTime(&local);
+  local = XMPUtils::ConvertToUTCTime(local);
   std::string text;
-  XMPUtils::ConvertFromDate(local, &text);
+  text = XMPUtils::ConvertFromDate(local);
   EXPECT_EQ(text, "2024-06-15T12:00Z");
   XMP_DateTime now;
-  XMPUtils::CurrentDateTime(&now);
+  now = XMPUtils::CurrentDateTime();
   EXPECT_TRUE(now.hasDate && now.hasTime && now.hasTimeZone);
 }
 
@@ -101,13 +101,13 @@ TEST(XMPConversions, NumbersAndBooleans) {
   for (const char* text : {"True", " t", "1"}) EXPECT_TRUE(XMPUtils::ConvertToBool(text)) << text;
   for (const char* text : {"FALSE", "0"}) EXPECT_FALSE(XMPUtils::ConvertToBool(text)) << text;
   std::string text;
-  XMPUtils::ConvertFromInt64(INT64_MIN, &text);
+  text = XMPUtils::ConvertFromInt64(INT64_MIN);
   EXPECT_EQ(text, "-9223372036854775808");
-  XMPUtils::ConvertFromBool(false, &text);
+  text = XMPUtils::ConvertFromBool(false);
   EXPECT_EQ(text, "False");
-  XMPUtils::ConvertFromFloat(1.0 / 3, "", &text);
+  text = XMPUtils::ConvertFromFloat(1.0 / 3, "");
   EXPECT_EQ(text, "0.333333");
-  XMPUtils::ConvertFromFloat(1.0 / 3, "%.3g", &text);
+  text = XMPUtils::ConvertFromFloat(1.0 / 3, "%.3g");
   EXPECT_EQ(text, "0.333");
   for (const char* text : {"9223372036854775808", "12abc", ""})
     EXPECT_EQ(xmptest::ErrorIdOf([&] { XMPUtils::ConvertToInt64(text); }), kXMPErr_BadValue) << text;

@@ -110,7 +110,7 @@ TEST_F(XMPProperties, TypedValuesUseTheTextForms) {
   meta.SetProperty_Int64(kTestNS, "L", -1234567890123LL);
   meta.SetProperty_Float(kTestNS, "F", 2.5);
   XMP_DateTime date;
-  XMPUtils::ConvertToDate("2024-03-05T07:08:09.25+02:00", &date);
+  date = XMPUtils::ConvertToDate("2024-03-05T07:08:09.25+02:00");
   meta.SetProperty_Date(kTestNS, "D", date);
   EXPECT_EQ(Get(meta, kTestNS, "B"), "True");
   EXPECT_EQ(Get(meta, kTestNS, "I"), "-42");

@@ -35,7 +35,7 @@ TEST(XMPThreads, EightThreadsOnTheirOwnPacketsAndOneSharedHandle) {
           std::string value, text;
           if (!own.GetProperty(ns, "Round", &value) || value != std::to_string(round)) ++failures;
           if (!aggregate.IsMultiValued(ns, "Round") || !own.IsMultiValued(ns, "Round")) ++failures;
-          XMPUtils::CatenateArrayItems(own, kXMP_NS_DC, "subject", "; ", "\"", 0, &text);
+          text = XMPUtils::CatenateArrayItems(own, kXMP_NS_DC, "subject", "; ", "\"", 0);
           XMPUtils::SeparateArrayItems(&member, kXMP_NS_DC, "subject", 0, text);
           if (member.CountArrayItems(kXMP_NS_DC, "subject") != 3) ++failures;
           member.SerializeToBuffer(&text);

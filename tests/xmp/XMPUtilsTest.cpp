@@ -33,13 +33,13 @@ std::vector<std::string> Items(const XMPMeta& meta, const std::string& ns, const
 
 TEST_F(XMPUtilsTest, ComposedPathsAreTheToolkitForms) {
   std::string path;
-  XMPUtils::ComposeArrayItemPath(kXMP_NS_DC, "subject", 3, &path);
+  path = XMPUtils::ComposeArrayItemPath(kXMP_NS_DC, "subject", 3);
   EXPECT_EQ(path, "subject[3]");
-  XMPUtils::ComposeArrayItemPath(kXMP_NS_DC, "subject", kXMP_ArrayLastItem, &path);
+  path = XMPUtils::ComposeArrayItemPath(kXMP_NS_DC, "subject", kXMP_ArrayLastItem);
   EXPECT_EQ(path, "subject[last()]");
-  XMPUtils::ComposeStructFieldPath(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "documentID", &path);
+  path = XMPUtils::ComposeStructFieldPath(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "documentID");
   EXPECT_EQ(path, "DerivedFrom/stRef:documentID");
-  XMPUtils::ComposeQualifierPath(kXMP_NS_DC, "creator[1]", kTestNS, "role", &path);
+  path = XMPUtils::ComposeQualifierPath(kXMP_NS_DC, "creator[1]", kTestNS, "role");
   EXPECT_EQ(path, "creator[1]/?ovt:role");
   // The composed paths work in every call.
   XMPMeta meta;
@@ -47,15 +47,11 @@ TEST_F(XMPUtilsTest, ComposedPathsAreTheToolkitForms) {
   meta.SetProperty(kXMP_NS_DC, path, "author");
   EXPECT_EQ(Get(meta, kXMP_NS_DC, "creator[last()]/?ovt:role"), "author");
   for (XMP_Index bad : {0, -2}) {
-    EXPECT_EQ(xmptest::ErrorIdOf([&] { XMPUtils::ComposeArrayItemPath(kXMP_NS_DC, "subject", bad, &path); }), kXMPErr_BadIndex);
+    EXPECT_EQ(xmptest::ErrorIdOf([&] { path = XMPUtils::ComposeArrayItemPath(kXMP_NS_DC, "subject", bad); }), kXMPErr_BadIndex);
   }
-  for (auto compose : {+[](std::string* p) {
-                         XMPUtils::ComposeStructFieldPath(kXMP_NS_DC, "s", "http://ovra.test/unregistered/", "f", p);
-                       },
-                       +[](std::string* p) {
-                         XMPUtils::ComposeQualifierPath(kXMP_NS_DC, "s", "http://ovra.test/unregistered/", "q", p);
-                       }}) {
-    EXPECT_EQ(xmptest::ErrorIdOf([&] { compose(&path); }), kXMPErr_BadSchema);
+  for (auto compose : {+[] { XMPUtils::ComposeStructFieldPath(kXMP_NS_DC, "s", "http://ovra.test/unregistered/", "f"); },
+                       +[] { XMPUtils::ComposeQualifierPath(kXMP_NS_DC, "s", "http://ovra.test/unregistered/", "q"); }}) {
+    EXPECT_EQ(xmptest::ErrorIdOf(compose), kXMPErr_BadSchema);
   }
 }
 
@@ -64,14 +60,13 @@ TEST_F(XMPUtilsTest, CatenateQuotesItemsThatNeedIt) {
   for (const char* item : {"plain", "semi;colon", "say \"hi\"", " padded", "comma,here", ""})
     meta.AppendArrayItem(kTestNS, "Bag", kXMP_PropValueIsArray, item);
   std::string text;
-  XMPUtils::CatenateArrayItems(meta, kTestNS, "Bag", "; ", "\"", 0, &text);
+  text = XMPUtils::CatenateArrayItems(meta, kTestNS, "Bag", "; ", "\"", 0);
   EXPECT_EQ(text, "plain; \"semi;colon\"; \"say \"\"hi\"\"\"; \" padded\"; comma,here; \"\"");
-  XMPUtils::CatenateArrayItems(meta, kTestNS, "Bag", ", ", "\"", kXMPUtil_AllowCommas, &text);
+  text = XMPUtils::CatenateArrayItems(meta, kTestNS, "Bag", ", ", "\"", kXMPUtil_AllowCommas);
   EXPECT_EQ(text, "plain, \"semi;colon\", \"say \"\"hi\"\"\", \" padded\", \"comma,here\", \"\"");
-  XMPUtils::CatenateArrayItems(meta, kTestNS, "Missing", "; ", "\"", 0, &text);
-  EXPECT_EQ(text, "");
+  EXPECT_EQ(XMPUtils::CatenateArrayItems(meta, kTestNS, "Missing", "; ", "\"", 0), "");
   meta.SetLocalizedText(kTestNS, "Alt", "", "x-default", "a");
-  EXPECT_THROW(XMPUtils::CatenateArrayItems(meta, kTestNS, "Alt", "; ", "\"", 0, &text), XMP_Error);
+  EXPECT_THROW(XMPUtils::CatenateArrayItems(meta, kTestNS, "Alt", "; ", "\"", 0), XMP_Error);
 }
 
 TEST_F(XMPUtilsTest, SeparateSplitsTrimsHonoursQuotesAndReplacesItems) {

@@ -157,26 +157,26 @@ bool ParseDate(const std::string& s, XMP_DateTime* t) {
 
 }  // namespace
 
-void XMPUtils::ConvertFromBool(bool binValue, std::string* strValue) {
-  *strValue = binValue ? "True" : "False";
+std::string XMPUtils::ConvertFromBool(bool binValue) {
+  return binValue ? "True" : "False";
 }
 
-void XMPUtils::ConvertFromInt(std::int32_t binValue, std::string* strValue) {
-  *strValue = std::to_string(binValue);
+std::string XMPUtils::ConvertFromInt(std::int32_t binValue) {
+  return std::to_string(binValue);
 }
 
-void XMPUtils::ConvertFromInt64(std::int64_t binValue, std::string* strValue) {
-  *strValue = std::to_string(binValue);
+std::string XMPUtils::ConvertFromInt64(std::int64_t binValue) {
+  return std::to_string(binValue);
 }
 
-void XMPUtils::ConvertFromFloat(double binValue, const std::string& format, std::string* strValue) {
+std::string XMPUtils::ConvertFromFloat(double binValue, const std::string& format) {
   char buffer[512];
   const int n = std::snprintf(buffer, sizeof buffer, format.empty() ? "%f" : format.c_str(), binValue);
   if (n < 0 || n >= static_cast<int>(sizeof buffer)) detail::Throw(kXMPErr_BadParam, "float format");
-  strValue->assign(buffer, static_cast<std::size_t>(n));
+  return std::string(buffer, static_cast<std::size_t>(n));
 }
 
-void XMPUtils::ConvertFromDate(const XMP_DateTime& t, std::string* strValue) {
+std::string XMPUtils::ConvertFromDate(const XMP_DateTime& t) {
   char buffer[128];
   std::string out;
   if (t.hasDate) {
@@ -216,7 +216,7 @@ void XMPUtils::ConvertFromDate(const XMP_DateTime& t, std::string* strValue) {
       }
     }
   }
-  *strValue = out;
+  return out;
 }
 
 bool XMPUtils::ConvertToBool(const std::string& strValue) {
@@ -268,40 +268,42 @@ double XMPUtils::ConvertToFloat(const std::string& strValue) {
   return value;
 }
 
-void XMPUtils::ConvertToDate(const std::string& strValue, XMP_DateTime* binValue) {
+XMP_DateTime XMPUtils::ConvertToDate(const std::string& strValue) {
   XMP_DateTime parsed;
   if (!ParseDate(Trimmed(strValue), &parsed)) BadValue("date", strValue);
-  *binValue = parsed;
+  return parsed;
 }
 
-void XMPUtils::ConvertToUTCTime(XMP_DateTime* time) {
-  if (!time->hasTime) return;
-  if (time->hasTimeZone && time->tzSign != 0) {
-    const std::int64_t offset = time->tzSign * (time->tzHour * 3600 + time->tzMinute * 60);
-    SetWallSeconds(WallSeconds(*time) - offset, time);
+XMP_DateTime XMPUtils::ConvertToUTCTime(XMP_DateTime time) {
+  if (!time.hasTime) return time;
+  if (time.hasTimeZone && time.tzSign != 0) {
+    const std::int64_t offset = time.tzSign * (time.tzHour * 3600 + time.tzMinute * 60);
+    SetWallSeconds(WallSeconds(time) - offset, &time);
   }
-  time->hasTimeZone = true;
-  time->tzSign = 0;
-  time->tzHour = 0;
-  time->tzMinute = 0;
+  time.hasTimeZone = true;
+  time.tzSign = 0;
+  time.tzHour = 0;
+  time.tzMinute = 0;
+  return time;
 }
 
-void XMPUtils::ConvertToLocalTime(XMP_DateTime* time) {
-  if (!time->hasTime) return;
-  ConvertToUTCTime(time);
-  const std::time_t instant = static_cast<std::time_t>(WallSeconds(*time));
+XMP_DateTime XMPUtils::ConvertToLocalTime(XMP_DateTime time) {
+  if (!time.hasTime) return time;
+  time = ConvertToUTCTime(time);
+  const std::time_t instant = static_cast<std::time_t>(WallSeconds(time));
   std::tm local{};
   localtime_r(&instant, &local);
   const long offset = local.tm_gmtoff;
-  SetWallSeconds(WallSeconds(*time) + offset, time);
-  time->hasTimeZone = true;
-  time->tzSign = offset == 0 ? 0 : (offset < 0 ? -1 : 1);
+  SetWallSeconds(WallSeconds(time) + offset, &time);
+  time.hasTimeZone = true;
+  time.tzSign = offset == 0 ? 0 : (offset < 0 ? -1 : 1);
   const long magnitude = offset < 0 ? -offset : offset;
-  time->tzHour = static_cast<std::int32_t>(magnitude / 3600);
-  time->tzMinute = static_cast<std::int32_t>(magnitude / 60 % 60);
+  time.tzHour = static_cast<std::int32_t>(magnitude / 3600);
+  time.tzMinute = static_cast<std::int32_t>(magnitude / 60 % 60);
+  return time;
 }
 
-void XMPUtils::CurrentDateTime(XMP_DateTime* time) {
+XMP_DateTime XMPUtils::CurrentDateTime() {
   std::timespec now{};
   std::timespec_get(&now, TIME_UTC);
   XMP_DateTime t;
@@ -309,8 +311,7 @@ void XMPUtils::CurrentDateTime(XMP_DateTime* time) {
   t.nanoSecond = static_cast<std::int32_t>(now.tv_nsec);
   t.hasTimeZone = true;
   SetWallSeconds(static_cast<std::int64_t>(now.tv_sec), &t);
-  ConvertToLocalTime(&t);
-  *time = t;
+  return ConvertToLocalTime(t);
 }
 
 }  // namespace ovraxmp

@@ -46,9 +46,9 @@ bool XMPDocOps::PrepareForSave(const std::string& mimeType) {
   if (mParts.empty()) return false;
 
   XMP_DateTime now;
-  XMPUtils::CurrentDateTime(&now);
+  now = XMPUtils::CurrentDateTime();
   std::string when;
-  XMPUtils::ConvertFromDate(now, &when);
+  when = XMPUtils::ConvertFromDate(now);
   std::string changed;
   for (const std::string& part : mParts) {
     if (!changed.empty()) changed += ';';
@@ -59,7 +59,7 @@ bool XMPDocOps::PrepareForSave(const std::string& mimeType) {
   XMPMeta& meta = mMeta;
   meta.AppendArrayItem(kXMP_NS_XMP_MM, "History", kXMP_PropArrayIsOrdered, std::string(), kXMP_PropValueIsStruct);
   std::string event;
-  XMPUtils::ComposeArrayItemPath(kXMP_NS_XMP_MM, "History", kXMP_ArrayLastItem, &event);
+  event = XMPUtils::ComposeArrayItemPath(kXMP_NS_XMP_MM, "History", kXMP_ArrayLastItem);
   const char* evt = kXMP_NS_XMP_ResourceEvent;
   meta.SetStructField(kXMP_NS_XMP_MM, event, evt, "action", "saved");
   meta.SetStructField(kXMP_NS_XMP_MM, event, evt, "instanceID", instanceID);

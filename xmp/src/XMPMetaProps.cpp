@@ -631,35 +631,35 @@ bool XMPMeta::GetProperty_Float(const std::string& ns, const std::string& name, 
 void XMPMeta::SetProperty_Bool(const std::string& ns, const std::string& name, bool value,
                                XMP_OptionBits options) {
   std::string text;
-  XMPUtils::ConvertFromBool(value, &text);
+  text = XMPUtils::ConvertFromBool(value);
   SetProperty(ns, name, text, options);
 }
 
 void XMPMeta::SetProperty_Int(const std::string& ns, const std::string& name, std::int32_t value,
                               XMP_OptionBits options) {
   std::string text;
-  XMPUtils::ConvertFromInt(value, &text);
+  text = XMPUtils::ConvertFromInt(value);
   SetProperty(ns, name, text, options);
 }
 
 void XMPMeta::SetProperty_Int64(const std::string& ns, const std::string& name, std::int64_t value,
                                 XMP_OptionBits options) {
   std::string text;
-  XMPUtils::ConvertFromInt64(value, &text);
+  text = XMPUtils::ConvertFromInt64(value);
   SetProperty(ns, name, text, options);
 }
 
 void XMPMeta::SetProperty_Float(const std::string& ns, const std::string& name, double value,
                                 XMP_OptionBits options) {
   std::string text;
-  XMPUtils::ConvertFromFloat(value, std::string(), &text);
+  text = XMPUtils::ConvertFromFloat(value, std::string());
   SetProperty(ns, name, text, options);
 }
 
 void XMPMeta::SetProperty_Date(const std::string& ns, const std::string& name, const XMP_DateTime& value,
                                XMP_OptionBits options) {
   std::string text;
-  XMPUtils::ConvertFromDate(value, &text);
+  text = XMPUtils::ConvertFromDate(value);
   SetProperty(ns, name, text, options);
 }
 
@@ -754,7 +754,7 @@ void XMPMeta::DeleteArrayItem(const std::string& nsIn, const std::string& arrayN
   const std::string& ns = aliased ? aliasNS : nsIn;
   const std::string& arrayName = aliased ? aliasPath : arrayNameIn;
   std::string path;
-  XMPUtils::ComposeArrayItemPath(ns, arrayName, index, &path);
+  path = XMPUtils::ComposeArrayItemPath(ns, arrayName, index);
   bool exists = false;
   RequireArray(X(mRef), ns, arrayName, &exists);
   if (exists) DeleteProperty(ns, path);
@@ -793,7 +793,7 @@ XMP_Index XMPMeta::CountArrayItems(const std::string& nsIn, const std::string& a
 bool XMPMeta::GetStructField(const std::string& ns, const std::string& structName, const std::string& fieldNS,
                              const std::string& fieldName, std::string* value, XMP_OptionBits* options) const {
   std::string path;
-  XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName, &path);
+  path = XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName);
   XMP_OptionBits parent = 0;
   if (!NodeOptions(X(mRef), ns, structName, &parent)) return false;
   if (!(parent & kXMP_PropValueIsStruct)) detail::Throw(kXMPErr_BadXPath, "\"" + structName + "\" is not a structure");
@@ -803,7 +803,7 @@ bool XMPMeta::GetStructField(const std::string& ns, const std::string& structNam
 void XMPMeta::SetStructField(const std::string& ns, const std::string& structName, const std::string& fieldNS,
                              const std::string& fieldName, const std::string& value, XMP_OptionBits options) {
   std::string path;
-  XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName, &path);
+  path = XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName);
   XMP_OptionBits parent = 0;
   if (NodeOptions(X(mRef), ns, structName, &parent) && !(parent & kXMP_PropValueIsStruct))
     detail::Throw(kXMPErr_BadXPath, "\"" + structName + "\" is not a structure");

@@ -149,9 +149,7 @@ void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_O
   } catch (const XMP_Error&) {
     // A foreign value in our own counter: restart the count, keep collecting.
   }
-  std::string next;
-  ConvertFromInt64(count + 1, &next);
-  target.SetProperty(kXMP_NS_Transient, kMultiFileCount, next);
+  target.SetProperty(kXMP_NS_Transient, kMultiFileCount, ConvertFromInt64(count + 1));
 
   const std::map<Key, Property> have = PropertiesByKey(target);
   const std::map<Key, Property> incoming = PropertiesByKey(source);
@@ -194,8 +192,8 @@ void XMPUtils::MultiFileDistribute(const XMPMeta& aggregate, XMPMeta* memberPtr,
   // The deletion records: "prefix:path" of each deleted property.
   const XMP_Index records = aggregate.CountArrayItems(kXMP_NS_Transient, kDeletedProperties);
   for (XMP_Index i = 1; i <= records; ++i) {
-    std::string item, uri, path;
-    ComposeArrayItemPath(kXMP_NS_Transient, kDeletedProperties, i, &item);
+    const std::string item = ComposeArrayItemPath(kXMP_NS_Transient, kDeletedProperties, i);
+    std::string uri, path;
     XMP_OptionBits options = 0;
     if (!aggregate.GetProperty(kXMP_NS_Transient, item, nullptr, &options) || !(options & kXMP_PropValueIsStruct))
       continue;

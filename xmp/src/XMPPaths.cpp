@@ -15,35 +15,31 @@ void RequireName(const std::string& name, const char* what) {
 
 }  // namespace
 
-void XMPUtils::ComposeArrayItemPath(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex,
-                                    std::string* fullPath) {
+std::string XMPUtils::ComposeArrayItemPath(const std::string& schemaNS, const std::string& arrayName,
+                                           XMP_Index itemIndex) {
   detail::RequirePrefix(schemaNS);
   RequireName(arrayName, "array name");
-  if (itemIndex == kXMP_ArrayLastItem) {
-    *fullPath = arrayName + "[last()]";
-    return;
-  }
+  if (itemIndex == kXMP_ArrayLastItem) return arrayName + "[last()]";
   if (itemIndex <= 0) detail::Throw(kXMPErr_BadIndex, "array index " + std::to_string(itemIndex));
-  *fullPath = arrayName + "[" + std::to_string(itemIndex) + "]";
+  return arrayName + "[" + std::to_string(itemIndex) + "]";
 }
 
-void XMPUtils::ComposeStructFieldPath(const std::string& schemaNS, const std::string& structName,
-                                      const std::string& fieldNS, const std::string& fieldName,
-                                      std::string* fullPath) {
+std::string XMPUtils::ComposeStructFieldPath(const std::string& schemaNS, const std::string& structName,
+                                             const std::string& fieldNS, const std::string& fieldName) {
   detail::RequirePrefix(schemaNS);
   RequireName(structName, "structure name");
   RequireName(fieldName, "field name");
   const std::string prefix = detail::RequirePrefix(fieldNS);
-  *fullPath = structName + "/" + prefix + fieldName;
+  return structName + "/" + prefix + fieldName;
 }
 
-void XMPUtils::ComposeQualifierPath(const std::string& schemaNS, const std::string& propName,
-                                    const std::string& qualNS, const std::string& qualName, std::string* fullPath) {
+std::string XMPUtils::ComposeQualifierPath(const std::string& schemaNS, const std::string& propName,
+                                           const std::string& qualNS, const std::string& qualName) {
   detail::RequirePrefix(schemaNS);
   RequireName(propName, "property name");
   RequireName(qualName, "qualifier name");
   const std::string prefix = detail::RequirePrefix(qualNS);
-  *fullPath = propName + "/?" + prefix + qualName;
+  return propName + "/?" + prefix + qualName;
 }
 
 bool XMPMeta::IsMultiValued(const std::string& ns, const std::string& path) const {

@@ -58,16 +58,14 @@ bool XMPUtils::IsInternalProperty(const std::string& schemaNS, const std::string
 
 // ---- array text ----
 
-void XMPUtils::CatenateArrayItems(const XMPMeta& xmpObj, const std::string& schemaNS, const std::string& arrayName,
-                                  const std::string& separator, const std::string& quotes, XMP_OptionBits options,
-                                  std::string* catedStr) {
-  if (!catedStr) detail::Throw(kXMPErr_BadParam, "no output string");
+std::string XMPUtils::CatenateArrayItems(const XMPMeta& xmpObj, const std::string& schemaNS,
+                                         const std::string& arrayName, const std::string& separator,
+                                         const std::string& quotes, XMP_OptionBits options) {
   detail::Require(xmpObj.GetInternalRef());
   const char open = quotes.empty() ? '"' : quotes[0];
   const char close = quotes.size() > 1 ? quotes[1] : open;
   XMP_OptionBits form = 0;
-  catedStr->clear();
-  if (!xmpObj.GetProperty(schemaNS, arrayName, nullptr, &form)) return;
+  if (!xmpObj.GetProperty(schemaNS, arrayName, nullptr, &form)) return std::string();
   if (!(form & kXMP_PropValueIsArray) || (form & kXMP_PropArrayIsAlternate))
     detail::Throw(kXMPErr_BadParam, "\"" + arrayName + "\" is not an unordered or ordered array");
   std::string special = ";";
@@ -97,7 +95,7 @@ void XMPUtils::CatenateArrayItems(const XMPMeta& xmpObj, const std::string& sche
     }
     out += close;
   }
-  *catedStr = std::move(out);
+  return out;
 }
 
 void XMPUtils::SeparateArrayItems(XMPMeta* xmpObj, const std::string& schemaNS, const std::string& arrayName,

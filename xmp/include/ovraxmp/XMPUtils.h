@@ -15,28 +15,26 @@ class XMPUtils {
   // ---- Path composition (the texts every path-taking call accepts) ----
   // "arrayName[i]", or "arrayName[last()]" for kXMP_ArrayLastItem; an index
   // of 0 or below -1 raises kXMPErr_BadIndex.
-  static void ComposeArrayItemPath(const std::string& schemaNS, const std::string& arrayName,
-                                   XMP_Index itemIndex, std::string* fullPath);
+  static std::string ComposeArrayItemPath(const std::string& schemaNS, const std::string& arrayName,
+                                          XMP_Index itemIndex);
   // "structName/prefix:fieldName"; an unregistered fieldNS raises
   // kXMPErr_BadSchema.
-  static void ComposeStructFieldPath(const std::string& schemaNS, const std::string& structName,
-                                     const std::string& fieldNS, const std::string& fieldName,
-                                     std::string* fullPath);
+  static std::string ComposeStructFieldPath(const std::string& schemaNS, const std::string& structName,
+                                            const std::string& fieldNS, const std::string& fieldName);
   // "propName/?prefix:qualName"; an unregistered qualNS raises kXMPErr_BadSchema.
-  static void ComposeQualifierPath(const std::string& schemaNS, const std::string& propName,
-                                   const std::string& qualNS, const std::string& qualName,
-                                   std::string* fullPath);
+  static std::string ComposeQualifierPath(const std::string& schemaNS, const std::string& propName,
+                                          const std::string& qualNS, const std::string& qualName);
 
   // ---- Conversions; text that does not convert raises kXMPErr_BadValue ----
-  static void ConvertFromBool(bool binValue, std::string* strValue);        // "True"/"False"
-  static void ConvertFromInt(std::int32_t binValue, std::string* strValue);
-  static void ConvertFromInt64(std::int64_t binValue, std::string* strValue);
+  static std::string ConvertFromBool(bool binValue);        // "True"/"False"
+  static std::string ConvertFromInt(std::int32_t binValue);
+  static std::string ConvertFromInt64(std::int64_t binValue);
   // printf-style format; empty means "%f".
-  static void ConvertFromFloat(double binValue, const std::string& format, std::string* strValue);
+  static std::string ConvertFromFloat(double binValue, const std::string& format);
   // ISO 8601 in the shortest form the record allows ("2024", "2024-03",
   // "2024-03-05", "2024-03-05T07:08", with seconds and fractions when not
   // zero, then "Z" or "+hh:mm" when the record has a zone).
-  static void ConvertFromDate(const XMP_DateTime& binValue, std::string* strValue);
+  static std::string ConvertFromDate(const XMP_DateTime& binValue);
   // "true"/"false"/"t"/"f"/"1"/"0", any case, blanks around ignored.
   static bool ConvertToBool(const std::string& strValue);
   static std::int32_t ConvertToInt(const std::string& strValue);
@@ -44,14 +42,14 @@ class XMPUtils {
   static std::int64_t ConvertToInt64(const std::string& strValue);
   static double ConvertToFloat(const std::string& strValue);
   // Every ISO 8601 form XMP allows, also a time alone ("T07:08", "07:08:09Z").
-  static void ConvertToDate(const std::string& strValue, XMP_DateTime* binValue);
+  static XMP_DateTime ConvertToDate(const std::string& strValue);
   // Moves a time with a zone to UTC (sign 0); a time without zone is taken
   // as UTC already. Dates without time are left alone.
-  static void ConvertToUTCTime(XMP_DateTime* time);
+  static XMP_DateTime ConvertToUTCTime(XMP_DateTime time);
   // Moves a time with a zone to the machine's local zone.
-  static void ConvertToLocalTime(XMP_DateTime* time);
+  static XMP_DateTime ConvertToLocalTime(XMP_DateTime time);
   // Now, in the local zone, with the zone offset.
-  static void CurrentDateTime(XMP_DateTime* time);
+  static XMP_DateTime CurrentDateTime();
 
   // ---- Array text ----
   // Joins the items of a simple-item, non-alternate array with separator;
@@ -59,10 +57,9 @@ class XMPUtils {
   // (or an empty item) is quoted, inner quotes doubled. quotes holds the
   // quote character (first) and optionally a different closing one; empty
   // means '"'. An absent array gives the empty string.
-  static void CatenateArrayItems(const XMPMeta& xmpObj, const std::string& schemaNS,
-                                 const std::string& arrayName, const std::string& separator,
-                                 const std::string& quotes, XMP_OptionBits options,
-                                 std::string* catedStr);
+  static std::string CatenateArrayItems(const XMPMeta& xmpObj, const std::string& schemaNS,
+                                        const std::string& arrayName, const std::string& separator,
+                                        const std::string& quotes, XMP_OptionBits options);
   // Splits on ';' (and ',' with kXMPUtil_AllowCommas), trims blanks around
   // items, honours '"' quoting, and replaces the array's items in order. An
   // absent array is created with the form in options (kXMP_PropArrayIsOrdered
