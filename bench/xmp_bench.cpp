@@ -84,9 +84,8 @@ void BM_GetProperty_Layer(benchmark::State& state) {
   XMPMeta meta = ParsedTypicalPacket();
   // Callers hold their names as strings already.
   const std::string ns = kNS, name = "Simple5";
-  std::string value;
   for (auto _ : state) {
-    meta.GetProperty(ns, name, &value);
+    auto value = meta.GetProperty(ns, name);
     benchmark::DoNotOptimize(value);
   }
 }
@@ -113,9 +112,8 @@ BENCHMARK(BM_GetProperty_Raw);
 void BM_GetPropertyInt_Layer(benchmark::State& state) {
   XMPMeta meta = ParsedTypicalPacket();
   const std::string ns = kNS, name = "Number";
-  std::int32_t value = 0;
   for (auto _ : state) {
-    meta.GetProperty_Int(ns, name, &value);
+    auto value = meta.GetProperty_Int(ns, name);
     benchmark::DoNotOptimize(value);
   }
 }

@@ -75,12 +75,13 @@ std::vector<StoredNamespace> GetStoredNamespaces(XMPMetaRef xmp) {
   try {
     const XMPMeta meta(xmp);
     XMPIterator schemas(meta, ovraxmp::kXMP_IterJustChildren);
-    std::string ns, path, value, prefix;
+    std::string ns, path, value;
     ovraxmp::XMP_OptionBits options = 0;
     while (schemas.Next(&ns, &path, &value, &options)) {
-      if (ns.empty() || !XMPMeta::GetNamespacePrefix(ns, &prefix)) continue;
-      if (!prefix.empty() && prefix.back() == ':') prefix.pop_back();
-      namespaces.push_back({ns, prefix});
+      auto prefix = ns.empty() ? std::nullopt : XMPMeta::GetNamespacePrefix(ns);
+      if (!prefix) continue;
+      if (!prefix->empty() && prefix->back() == ':') prefix->pop_back();
+      namespaces.push_back({ns, *prefix});
     }
   } catch (...) {
     // A packet the toolkit cannot walk stores nothing that can be shown.

@@ -37,15 +37,14 @@ bool WriteEmptySimpleText(ovraxmp::XMPMeta& meta, const Path& path) {
   const std::string& name = path.description;
   bool written = false;
   try {
-    std::string old;
-    const bool present = meta.GetProperty(ns, name, &old);
+    const auto old = meta.GetProperty(ns, name);
     const bool multiValued = meta.IsMultiValued(ns, name);
-    const bool differs = present && !old.empty();
+    const bool differs = old && !old->value.empty();
     if (!multiValued && !differs) return false;
     meta.SetProperty(ns, name, std::string());
     written = true;
-    std::string readBack;
-    if (!meta.GetProperty(ns, name, &readBack) || !readBack.empty()) {
+    const auto readBack = meta.GetProperty(ns, name);
+    if (!readBack || !readBack->value.empty()) {
       ReportInvalidData(kErrorWritingXMP, path);
     }
     if (multiValued) meta.ClearMultiValueInfo(ns, name);
@@ -125,15 +124,12 @@ void MarkMultiValueDeleted(XMPMetaRef xmp, const Path& path) {
     }
     meta.AppendArrayItem(transient, kDeletedProperties, ovraxmp::kXMP_PropArrayIsUnordered,
                          std::string(), ovraxmp::kXMP_PropValueIsStruct);
-    std::string itemPath;
-    itemPath = ovraxmp::XMPUtils::ComposeArrayItemPath(transient, kDeletedProperties,
-                                            ovraxmp::kXMP_ArrayLastItem);
+    const std::string itemPath =
+        ovraxmp::XMPUtils::ComposeArrayItemPath(transient, kDeletedProperties, ovraxmp::kXMP_ArrayLastItem);
     meta.SetStructField(transient, itemPath, transient, kDelURI, path.namespaceURI);
-    std::string prefix;
-    if (!ovraxmp::XMPMeta::GetNamespacePrefix(path.namespaceURI, &prefix)) {
-      throw ovraxmp::XMP_Error(ovraxmp::kXMPErr_BadSchema, "unregistered namespace");
-    }
-    meta.SetStructField(transient, itemPath, transient, kDelPath, prefix + path.description);
+    const auto prefix = ovraxmp::XMPMeta::GetNamespacePrefix(path.namespaceURI);
+    if (!prefix) throw ovraxmp::XMP_Error(ovraxmp::kXMPErr_BadSchema, "unregistered namespace");
+    meta.SetStructField(transient, itemPath, transient, kDelPath, *prefix + path.description);
   } catch (...) {
     ReportInvalidData(kErrorReadingXMP, path);
   }
@@ -156,10 +152,9 @@ bool DeleteValue(XMPMetaRef xmp, const Path& path) {
     if (parentType && IsArrayType(*parentType)) return WriteEmptySimpleText(meta, path);
     meta.DeleteProperty(ns, path.description);
     if (parentType && !parentType->fields.empty()) {
-      std::string prefix;
-      if (ovraxmp::XMPMeta::GetNamespacePrefix(ns, &prefix)) {
+      if (const auto prefix = ovraxmp::XMPMeta::GetNamespacePrefix(ns)) {
         // The toolkit's prefix carries its colon, as the iterator's paths do.
-        RemoveEmptiedStructures(meta, ns, std::string(), false, prefix + path.description);
+        RemoveEmptiedStructures(meta, ns, std::string(), false, *prefix + path.description);
       }
     }
     MarkMultiValueDeleted(xmp, path);
@@ -311,15 +306,14 @@ void SetMinimalFloatValue(const Value& value, double number) {
     ovraxmp::XMPMeta meta(*access);
     const std::string& ns = path.namespaceURI;
     const std::string& name = path.description;
-    double current = 0.0;
-    const bool exists = meta.GetProperty_Float(ns, name, &current);
+    const std::optional<double> current = meta.GetProperty_Float(ns, name);
     const bool multiValued = meta.IsMultiValued(ns, name);
-    if (exists && !multiValued && current == number) return;
+    if (current && !multiValued && *current == number) return;
     char buffer[512];
     std::snprintf(buffer, sizeof buffer, "%1.*lg", 17, number);
     meta.SetProperty(ns, name, buffer);
-    double readBack = 0.0;
-    if (!meta.GetProperty_Float(ns, name, &readBack) || std::fabs(readBack - number) >= 0.0001) {
+    const std::optional<double> readBack = meta.GetProperty_Float(ns, name);
+    if (!readBack || std::fabs(*readBack - number) >= 0.0001) {
       ReportInvalidData(kErrorWritingXMP, path);
     }
     if (multiValued) meta.ClearMultiValueInfo(ns, name);

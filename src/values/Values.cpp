@@ -54,10 +54,24 @@ bool IsDateEntry(const EntryDefinition& entry) {
 // the reader itself answers false for a missing property, which spares the
 // generic procedure a separate existence test on the hot path.
 
+// Copies a value that was read into out; false when there was none.
+template <class T, class U>
+bool Take(std::optional<U> read, T& out) {
+  if (!read) return false;
+  out = static_cast<T>(*read);
+  return true;
+}
+
+bool Take(std::optional<ovraxmp::XMP_Node> read, UTF8String& out) {
+  if (!read) return false;
+  out = std::move(read->value);
+  return true;
+}
+
 struct SimpleText {
   static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
-    return meta.GetProperty(path.namespaceURI, path.description, &out);
+    return Take(meta.GetProperty(path.namespaceURI, path.description), out);
   }
   void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
     meta.SetProperty(path.namespaceURI, path.description, value);
@@ -84,9 +98,10 @@ struct ArrayText {
 struct AltText {
   static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
-    std::string actualLanguage;
-    return meta.GetLocalizedText(path.namespaceURI, path.description, std::string(),
-                                 kDefaultLanguage, &actualLanguage, &out);
+    auto chosen = meta.GetLocalizedText(path.namespaceURI, path.description, std::string(), kDefaultLanguage);
+    if (!chosen) return false;
+    out = std::move(chosen->value);
+    return true;
   }
   void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
     meta.SetLocalizedText(path.namespaceURI, path.description, std::string(), kDefaultLanguage,
@@ -104,10 +119,9 @@ struct LanguageText {
   ovraxmp::XMP_Index Find(const XMPMeta& meta, const Path& path) const {
     if (!meta.DoesPropertyExist(path.namespaceURI, path.description)) return 0;
     const ovraxmp::XMP_Index count = meta.CountArrayItems(path.namespaceURI, path.description);
-    std::string tag;
     for (ovraxmp::XMP_Index i = 1; i <= count; ++i) {
-      if (meta.GetProperty(path.namespaceURI, ItemLanguagePath(path, i), &tag) &&
-          ovracore::EqualsIgnoreCaseASCII(tag, language)) {
+      const auto tag = meta.GetProperty(path.namespaceURI, ItemLanguagePath(path, i));
+      if (tag && ovracore::EqualsIgnoreCaseASCII(tag->value, language)) {
         return i;
       }
     }
@@ -118,7 +132,7 @@ struct LanguageText {
   }
   bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
     const ovraxmp::XMP_Index index = Find(meta, path);
-    return index > 0 && meta.GetArrayItem(path.namespaceURI, path.description, index, &out);
+    return index > 0 && Take(meta.GetArrayItem(path.namespaceURI, path.description, index), out);
   }
   void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
     const ovraxmp::XMP_Index index = Find(meta, path);
@@ -166,24 +180,20 @@ bool IsAltTextEntry(const Path& path) {
 struct DateText {
   static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, UTF8String& out) const {
-    std::string stored;
-    if (!meta.GetProperty(path.namespaceURI, path.description, &stored)) return false;
-    ovraxmp::XMP_DateTime dateTime;
-    dateTime = XMPUtils::ConvertToDate(stored);
-    out = XMPUtils::ConvertFromDate(dateTime);
+    const auto stored = meta.GetProperty(path.namespaceURI, path.description);
+    if (!stored) return false;
+    out = XMPUtils::ConvertFromDate(XMPUtils::ConvertToDate(stored->value));
     return true;
   }
   void Write(XMPMeta& meta, const Path& path, const UTF8String& value) const {
-    ovraxmp::XMP_DateTime dateTime;
-    dateTime = XMPUtils::ConvertToDate(value);
-    meta.SetProperty_Date(path.namespaceURI, path.description, dateTime);
+    meta.SetProperty_Date(path.namespaceURI, path.description, XMPUtils::ConvertToDate(value));
   }
 };
 
 struct BoolValue {
   static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, bool& out) const {
-    return meta.GetProperty_Bool(path.namespaceURI, path.description, &out);
+    return Take(meta.GetProperty_Bool(path.namespaceURI, path.description), out);
   }
   void Write(XMPMeta& meta, const Path& path, bool value) const {
     meta.SetProperty_Bool(path.namespaceURI, path.description, value);
@@ -193,10 +203,7 @@ struct BoolValue {
 struct IntValue {
   static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, int& out) const {
-    std::int32_t value = 0;
-    if (!meta.GetProperty_Int(path.namespaceURI, path.description, &value)) return false;
-    out = value;
-    return true;
+    return Take(meta.GetProperty_Int(path.namespaceURI, path.description), out);
   }
   void Write(XMPMeta& meta, const Path& path, int value) const {
     meta.SetProperty_Int(path.namespaceURI, path.description, value);
@@ -206,10 +213,7 @@ struct IntValue {
 struct Int64Value {
   static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, long long& out) const {
-    std::int64_t value = 0;
-    if (!meta.GetProperty_Int64(path.namespaceURI, path.description, &value)) return false;
-    out = value;
-    return true;
+    return Take(meta.GetProperty_Int64(path.namespaceURI, path.description), out);
   }
   void Write(XMPMeta& meta, const Path& path, long long value) const {
     meta.SetProperty_Int64(path.namespaceURI, path.description, value);
@@ -219,7 +223,7 @@ struct Int64Value {
 struct DoubleValue {
   static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, double& out) const {
-    return meta.GetProperty_Float(path.namespaceURI, path.description, &out);
+    return Take(meta.GetProperty_Float(path.namespaceURI, path.description), out);
   }
   void Write(XMPMeta& meta, const Path& path, double value) const {
     meta.SetProperty_Float(path.namespaceURI, path.description, value);
@@ -229,11 +233,9 @@ struct DoubleValue {
 struct DateValue {
   static constexpr bool kReadsAbsentAsFalse = true;
   bool Read(const XMPMeta& meta, const Path& path, Date& out) const {
-    std::string stored;
-    if (!meta.GetProperty(path.namespaceURI, path.description, &stored)) return false;
-    ovraxmp::XMP_DateTime dateTime;
-    dateTime = XMPUtils::ConvertToDate(stored);
-    dateTime = XMPUtils::ConvertToUTCTime(dateTime);
+    const auto stored = meta.GetProperty(path.namespaceURI, path.description);
+    if (!stored) return false;
+    const ovraxmp::XMP_DateTime dateTime = XMPUtils::ConvertToUTCTime(XMPUtils::ConvertToDate(stored->value));
     out.year = dateTime.year;
     out.month = dateTime.month;
     out.day = dateTime.day;
@@ -552,11 +554,9 @@ std::vector<UTF8String> GetAltTextLanguages(XMPMetaRef xmp, const Path& path) {
     const XMPMeta meta(xmp);
     if (!meta.DoesPropertyExist(path.namespaceURI, path.description)) return languages;
     const auto count = meta.CountArrayItems(path.namespaceURI, path.description);
-    std::string tag;
     for (ovraxmp::XMP_Index i = 1; i <= count; ++i) {
-      if (meta.GetProperty(path.namespaceURI, LanguageText::ItemLanguagePath(path, i), &tag)) {
-        languages.push_back(tag);
-      }
+      if (const auto tag = meta.GetProperty(path.namespaceURI, LanguageText::ItemLanguagePath(path, i)))
+        languages.push_back(tag->value);
     }
   } catch (...) {
     ReportInvalidData(kErrorReadingXMP, path);

@@ -23,13 +23,11 @@ const std::string kTitled = "<pt:Title>first</pt:Title>";
 std::string LastChangedParts(const std::string& bytes) {
   ovraxmp::XMPMeta meta;
   meta.ParseFromBuffer(bytes);
-  std::string item;
-  item = ovraxmp::XMPUtils::ComposeArrayItemPath(ovraxmp::kXMP_NS_XMP_MM, "History",
-                                          ovraxmp::kXMP_ArrayLastItem);
-  std::string changed;
-  meta.GetStructField(ovraxmp::kXMP_NS_XMP_MM, item, ovraxmp::kXMP_NS_XMP_ResourceEvent, "changed",
-                      &changed);
-  return changed;
+  const std::string item =
+      ovraxmp::XMPUtils::ComposeArrayItemPath(ovraxmp::kXMP_NS_XMP_MM, "History", ovraxmp::kXMP_ArrayLastItem);
+  return meta.GetStructField(ovraxmp::kXMP_NS_XMP_MM, item, ovraxmp::kXMP_NS_XMP_ResourceEvent, "changed")
+      .value_or(ovraxmp::XMP_Node())
+      .value;
 }
 
 // A provider that claims to write its own change list.

@@ -113,9 +113,8 @@ GetValueResult ResultOf(XMPMetaRef xmp, const Path& path) {
 }
 
 std::string Raw(XMPMetaRef xmp, const std::string& ns, const std::string& name) {
-  std::string value;
-  if (!xmp || !ovraxmp::XMPMeta(xmp).GetProperty(ns, name, &value)) return "<absent>";
-  return value;
+  const auto node = xmp ? ovraxmp::XMPMeta(xmp).GetProperty(ns, name) : std::nullopt;
+  return node ? node->value : "<absent>";
 }
 
 // ---------------------------------------------------------------------------

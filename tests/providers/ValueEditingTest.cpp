@@ -32,19 +32,14 @@ std::vector<std::string> Items(const ovraxmp::XMPMeta& meta, const std::string& 
                         ? meta.CountArrayItems(ovratest::kTestNS, name)
                         : 0;
   for (int i = 1; i <= count; ++i) {
-    std::string value;
-    meta.GetArrayItem(ovratest::kTestNS, name, i, &value);
-    items.push_back(value);
+    items.push_back(meta.GetArrayItem(ovratest::kTestNS, name, i).value_or(ovraxmp::XMP_Node()).value);
   }
   return items;
 }
 
 ovraxmp::XMP_OptionBits Options(const ovraxmp::XMPMeta& meta, const std::string& ns,
                                 const std::string& path) {
-  std::string value;
-  ovraxmp::XMP_OptionBits options = 0;
-  meta.GetProperty(ns, path, &value, &options);
-  return options;
+  return meta.GetProperty(ns, path).value_or(ovraxmp::XMP_Node()).options;
 }
 
 // A packet marked as the aggregate of several files.
@@ -60,11 +55,11 @@ std::vector<std::pair<std::string, std::string>> DeletionRecords(const ovraxmp::
   if (!meta.DoesPropertyExist(kTransient, "DeletedProperties")) return records;
   const int count = meta.CountArrayItems(kTransient, "DeletedProperties");
   for (int i = 1; i <= count; ++i) {
-    std::string item, uri, path;
-    item = ovraxmp::XMPUtils::ComposeArrayItemPath(kTransient, "DeletedProperties", i);
-    meta.GetStructField(kTransient, item, kTransient, "DelURI", &uri);
-    meta.GetStructField(kTransient, item, kTransient, "DelPath", &path);
-    records.emplace_back(uri, path);
+    const std::string item = ovraxmp::XMPUtils::ComposeArrayItemPath(kTransient, "DeletedProperties", i);
+    const auto field = [&](const char* name) {
+      return meta.GetStructField(kTransient, item, kTransient, name).value_or(ovraxmp::XMP_Node()).value;
+    };
+    records.emplace_back(field("DelURI"), field("DelPath"));
   }
   return records;
 }

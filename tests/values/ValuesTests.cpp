@@ -258,11 +258,10 @@ TEST_F(ValuesTest, MultiValuedPropertyReadsAsMixedAndIsAlwaysWritten) {
 }
 
 TEST_F(ValuesTest, EachFormIsWrittenInItsStorageForm) {
-  std::string item;
+  const auto item = [&](const char* array, int index) { return mMeta.GetArrayItem(kNS, array, index)->value; };
   EXPECT_TRUE(SetValue(Packet(), P("Keywords"), "one; two"));
   ASSERT_EQ(mMeta.CountArrayItems(kNS, "Keywords"), 2);
-  mMeta.GetArrayItem(kNS, "Keywords", 2, &item);
-  EXPECT_EQ(item, "two");
+  EXPECT_EQ(item("Keywords", 2), "two");
   // Stored as two items and read back as "three; four": only spaces differ,
   // so the verification after the write reports nothing.
   EXPECT_TRUE(SetValue(Packet(), P("Keywords"), "three;four"));
@@ -270,19 +269,13 @@ TEST_F(ValuesTest, EachFormIsWrittenInItsStorageForm) {
 
   mMeta.DeleteProperty(kNS, "Steps");
   EXPECT_TRUE(SetValue(Packet(), P("Steps"), "first; \"se;cond\""));
-  ovraxmp::XMP_OptionBits options = 0;
-  mMeta.GetProperty(kNS, "Steps", &item, &options);
-  EXPECT_TRUE(options & ovraxmp::kXMP_PropArrayIsOrdered);
-  mMeta.GetArrayItem(kNS, "Steps", 2, &item);
-  EXPECT_EQ(item, "se;cond");
+  EXPECT_TRUE(mMeta.GetProperty(kNS, "Steps")->options & ovraxmp::kXMP_PropArrayIsOrdered);
+  EXPECT_EQ(item("Steps", 2), "se;cond");
 
-  std::string language, text;
   EXPECT_TRUE(SetValue(Packet(), P("Caption"), "New caption"));
-  ASSERT_TRUE(mMeta.GetLocalizedText(kNS, "Caption", "", "x-default", &language, &text));
-  EXPECT_EQ(text, "New caption");
+  EXPECT_EQ(mMeta.GetLocalizedText(kNS, "Caption", "", "x-default")->value, "New caption");
   EXPECT_TRUE(SetValue(Packet(), P("Title"), "Bye"));
-  mMeta.GetProperty(kNS, "Title", &text);
-  EXPECT_EQ(text, "Bye");
+  EXPECT_EQ(mMeta.GetProperty(kNS, "Title")->value, "Bye");
   EXPECT_TRUE(SetValue(Packet(), P("When"), "2025-01-02T03:04:05Z"));
   Date date;
   ASSERT_TRUE(GetValue(Packet(), P("When"), date));

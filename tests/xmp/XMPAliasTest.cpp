@@ -28,18 +28,18 @@ XMPMeta Described() {
 TEST(XMPAliases, ReadsThroughAnAliasReachTheActualProperty) {
   const XMPMeta meta = Described();
   const auto alt = [&](const char* name, std::string* lang = nullptr) {
-    std::string text;
-    return meta.GetLocalizedText(kXMP_NS_TIFF, name, "", "x-default", lang, &text) ? text : "<absent>";
+    const auto chosen = meta.GetLocalizedText(kXMP_NS_TIFF, name, "", "x-default");
+    if (chosen && lang) *lang = chosen->language;
+    return chosen ? chosen->value : "<absent>";
   };
   testing::internal::CaptureStderr();
-  std::string lang, item;
+  std::string lang;
   EXPECT_EQ(alt("ImageDescription", &lang), "A harbour at dusk");
   EXPECT_EQ(lang, "x-default");
   EXPECT_EQ(alt("tiff:ImageDescription"), "A harbour at dusk");
   EXPECT_EQ(alt("Copyright"), "(c) Ana");
   EXPECT_EQ(meta.CountArrayItems(kPhotoshop, "Keywords"), 3);
-  EXPECT_TRUE(meta.GetArrayItem(kPhotoshop, "Keywords", 2, &item));
-  EXPECT_EQ(item, "boat");
+  EXPECT_EQ(meta.GetArrayItem(kPhotoshop, "Keywords", 2).value_or(XMP_Node()).value, "boat");
   EXPECT_EQ(xmptest::Get(meta, kXMP_NS_TIFF, "Artist"), "Ana");
   EXPECT_EQ(xmptest::Get(meta, kXMP_NS_TIFF, "ImageDescription[1]"), "A harbour at dusk");
   EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
@@ -50,14 +50,13 @@ TEST(XMPAliases, WritesThroughAnAliasChangeTheActualProperty) {
   meta.SetLocalizedText(kXMP_NS_TIFF, "ImageDescription", "", "x-default", "Boats");
   meta.AppendArrayItem(kPhotoshop, "Keywords", kXMP_PropValueIsArray, "net");
   meta.DeleteLocalizedText(kXMP_NS_TIFF, "Copyright", "", "x-default");
-  std::string text;
-  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "description", "", "x-default", nullptr, &text));
-  EXPECT_EQ(text, "Boats");
+  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "description", "", "x-default"));
+  EXPECT_EQ(meta.GetLocalizedText(kXMP_NS_DC, "description", "", "x-default")->value, "Boats");
   EXPECT_EQ(meta.CountArrayItems(kXMP_NS_DC, "subject"), 4);
-  EXPECT_FALSE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "x-default", nullptr, &text));
+  EXPECT_FALSE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "x-default"));
   // Without the actual property, the alias reads as absent.
   const XMPMeta empty;
-  EXPECT_FALSE(empty.GetLocalizedText(kXMP_NS_TIFF, "ImageDescription", "", "x-default", nullptr, &text));
+  EXPECT_FALSE(empty.GetLocalizedText(kXMP_NS_TIFF, "ImageDescription", "", "x-default"));
   EXPECT_EQ(empty.CountArrayItems(kPhotoshop, "Keywords"), 0);
 }
 

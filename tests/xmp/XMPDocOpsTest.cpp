@@ -19,9 +19,7 @@ TEST(XMPDocOps, SaveAppendsASavedEventAndSetsIds) {
   ops.NoteChange(std::vector<std::string>{"/metadata", "/metadata/dc/title"});
   EXPECT_TRUE(ops.PrepareForSave(""));
   ASSERT_EQ(meta.CountArrayItems(kXMP_NS_XMP_MM, "History"), 1);
-  XMP_OptionBits form = 0;
-  meta.GetProperty(kXMP_NS_XMP_MM, "History", nullptr, &form);
-  EXPECT_TRUE(form & kXMP_PropArrayIsOrdered);
+  EXPECT_TRUE(xmptest::OptionsOf(meta, kXMP_NS_XMP_MM, "History") & kXMP_PropArrayIsOrdered);
   EXPECT_EQ(Get(meta, kXMP_NS_XMP_MM, "History[1]/stEvt:action"), "saved");
   EXPECT_EQ(Get(meta, kXMP_NS_XMP_MM, "History[1]/stEvt:changed"), "/metadata/dc/title;/metadata");
   EXPECT_EQ(Get(meta, kXMP_NS_XMP_MM, "History[1]/stEvt:softwareAgent"), "ovraxmp tests");

@@ -32,13 +32,13 @@ TEST_F(XMPProperties, RealWorldPacketSurvivesSerialiseAndReparse) {
     EXPECT_EQ(Get(again, kXMP_NS_DC, "creator[2]"), "Bo Chen");
     EXPECT_EQ(Get(again, kXMP_NS_DC, "subject[2]"), "dusk; blue hour");
     EXPECT_EQ(Get(again, kXMP_NS_DC, "subject[3]"), "\"quoted\"");
-    std::string lang, value;
-    ASSERT_TRUE(again.GetLocalizedText(kXMP_NS_DC, "title", "fr", "fr-CH", &lang, &value));
-    EXPECT_EQ(lang, "fr-CH");
-    EXPECT_EQ(value, "Lac au crépuscule");
-    std::string field;
-    ASSERT_TRUE(again.GetStructField(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "documentID", &field));
-    EXPECT_EQ(field, "xmp.did:66666666-7777-8888-9999-000000000000");
+    const auto title = again.GetLocalizedText(kXMP_NS_DC, "title", "fr", "fr-CH");
+    ASSERT_TRUE(title);
+    EXPECT_EQ(title->language, "fr-CH");
+    EXPECT_EQ(title->value, "Lac au crépuscule");
+    const auto field = again.GetStructField(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "documentID");
+    ASSERT_TRUE(field);
+    EXPECT_EQ(field->value, "xmp.did:66666666-7777-8888-9999-000000000000");
     EXPECT_EQ(Get(again, kXMP_NS_XMP_MM, "History[1]/stEvt:action"), "created");
     EXPECT_EQ(Get(again, kXMP_NS_DM, "shotName/?xmpDM:good"), "True");
     EXPECT_EQ(Get(again, kXMP_NS_DM, "shotName"), "Take 7");
@@ -76,16 +76,13 @@ TEST_F(XMPProperties, ParseAcceptsBareRdfAndEmptyAndRejectsMalformed) {
 
 TEST_F(XMPProperties, SimpleGetSetDeleteExists) {
   XMPMeta meta;
-  std::string value = "untouched";
-  XMP_OptionBits options = 77;
-  EXPECT_FALSE(meta.GetProperty(kTestNS, "Name", &value, &options));
-  EXPECT_EQ(value, "untouched");
-  EXPECT_EQ(options, 77u);
+  EXPECT_FALSE(meta.GetProperty(kTestNS, "Name"));
   meta.SetProperty(kTestNS, "Name", "first");
   meta.SetProperty(kTestNS, "ovt:Name", "second");  // prefixed form names the same node
-  EXPECT_TRUE(meta.GetProperty(kTestNS, "Name", &value, &options));
-  EXPECT_EQ(value, "second");
-  EXPECT_EQ(options & kXMP_PropCompositeMask, 0u);
+  const auto name = meta.GetProperty(kTestNS, "Name");
+  ASSERT_TRUE(name);
+  EXPECT_EQ(name->value, "second");
+  EXPECT_EQ(name->options & kXMP_PropCompositeMask, 0u);
   EXPECT_TRUE(meta.DoesPropertyExist(kTestNS, "Name"));
   meta.DeleteProperty(kTestNS, "Name");
   meta.DeleteProperty(kTestNS, "Name");
@@ -98,7 +95,7 @@ TEST_F(XMPProperties, SimpleGetSetDeleteExists) {
   meta.SetProperty(kTestNS, "List", "text", kXMP_DeleteExisting);
   EXPECT_EQ(Get(meta, kTestNS, "List"), "text");
   // Unregistered namespaces: reads answer false, writes raise bad-schema.
-  EXPECT_FALSE(meta.GetProperty("http://ovra.test/unregistered/", "X", &value));
+  EXPECT_FALSE(meta.GetProperty("http://ovra.test/unregistered/", "X"));
   EXPECT_FALSE(meta.DoesPropertyExist("http://ovra.test/unregistered/", "X"));
   EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.SetProperty("http://ovra.test/unregistered/", "X", "1"); }), kXMPErr_BadSchema);
 }
@@ -117,22 +114,14 @@ TEST_F(XMPProperties, TypedValuesUseTheTextForms) {
   EXPECT_EQ(Get(meta, kTestNS, "L"), "-1234567890123");
   EXPECT_EQ(Get(meta, kTestNS, "F"), "2.500000");
   EXPECT_EQ(Get(meta, kTestNS, "D"), "2024-03-05T07:08:09.25+02:00");
-  bool b = false;
-  std::int32_t i = 0;
-  std::int64_t l = 0;
-  double f = 0;
-  EXPECT_TRUE(meta.GetProperty_Bool(kTestNS, "B", &b));
-  EXPECT_TRUE(meta.GetProperty_Int(kTestNS, "I", &i));
-  EXPECT_TRUE(meta.GetProperty_Int64(kTestNS, "L", &l));
-  EXPECT_TRUE(meta.GetProperty_Float(kTestNS, "F", &f));
-  EXPECT_TRUE(b);
-  EXPECT_EQ(i, -42);
-  EXPECT_EQ(l, -1234567890123LL);
-  EXPECT_DOUBLE_EQ(f, 2.5);
-  EXPECT_FALSE(meta.GetProperty_Int(kTestNS, "Missing", &i));
-  EXPECT_THROW(meta.GetProperty_Int(kTestNS, "L", &i), XMP_Error);  // out of 32-bit range
+  EXPECT_EQ(meta.GetProperty_Bool(kTestNS, "B"), std::optional<bool>(true));
+  EXPECT_EQ(meta.GetProperty_Int(kTestNS, "I"), std::optional<std::int32_t>(-42));
+  EXPECT_EQ(meta.GetProperty_Int64(kTestNS, "L"), std::optional<std::int64_t>(-1234567890123LL));
+  EXPECT_EQ(meta.GetProperty_Float(kTestNS, "F"), std::optional<double>(2.5));
+  EXPECT_FALSE(meta.GetProperty_Int(kTestNS, "Missing"));
+  EXPECT_THROW(meta.GetProperty_Int(kTestNS, "L"), XMP_Error);  // out of 32-bit range
   meta.SetProperty(kTestNS, "Text", "abc");
-  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.GetProperty_Float(kTestNS, "Text", &f); }), kXMPErr_BadValue);
+  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.GetProperty_Float(kTestNS, "Text"); }), kXMPErr_BadValue);
 }
 
 TEST_F(XMPProperties, ArraysAppendInsertCountAndDelete) {
@@ -148,25 +137,19 @@ TEST_F(XMPProperties, ArraysAppendInsertCountAndDelete) {
   // a b c c2 d e
   ASSERT_EQ(meta.CountArrayItems(kTestNS, "List"), 6);
   const char* expected[] = {"a", "b", "c", "c2", "d", "e"};
-  for (int i = 1; i <= 6; ++i) {
-    std::string item;
-    EXPECT_TRUE(meta.GetArrayItem(kTestNS, "List", i, &item));
-    EXPECT_EQ(item, expected[i - 1]);
-  }
-  std::string last;
-  EXPECT_TRUE(meta.GetArrayItem(kTestNS, "List", kXMP_ArrayLastItem, &last));
-  EXPECT_EQ(last, "e");
-  XMP_OptionBits form = 0;
-  meta.GetProperty(kTestNS, "List", nullptr, &form);
-  EXPECT_EQ(form & kXMP_PropArrayFormMask, kXMP_PropValueIsArray | kXMP_PropArrayIsOrdered);
-  EXPECT_FALSE(meta.GetArrayItem(kTestNS, "List", 7, &last));
+  const auto item = [&](XMP_Index i) { return meta.GetArrayItem(kTestNS, "List", i).value_or(XMP_Node{"<absent>"}).value; };
+  for (int i = 1; i <= 6; ++i) EXPECT_EQ(item(i), expected[i - 1]);
+  EXPECT_EQ(item(kXMP_ArrayLastItem), "e");
+  EXPECT_EQ(xmptest::OptionsOf(meta, kTestNS, "List") & kXMP_PropArrayFormMask,
+            kXMP_PropValueIsArray | kXMP_PropArrayIsOrdered);
+  EXPECT_FALSE(meta.GetArrayItem(kTestNS, "List", 7));
   meta.DeleteArrayItem(kTestNS, "List", 2);
   meta.DeleteArrayItem(kTestNS, "List", kXMP_ArrayLastItem);
   EXPECT_EQ(meta.CountArrayItems(kTestNS, "List"), 4);
   EXPECT_EQ(Get(meta, kTestNS, "List[2]"), "c");
   // Errors: bad index, item beyond the end, a simple property used as array.
   for (XMP_Index bad : {0, -2})
-    EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.GetArrayItem(kTestNS, "List", bad, &last); }), kXMPErr_BadIndex);
+    EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.GetArrayItem(kTestNS, "List", bad); }), kXMPErr_BadIndex);
   EXPECT_THROW(meta.SetArrayItem(kTestNS, "List", 9, "z"), XMP_Error);
   meta.SetProperty(kTestNS, "Simple", "s");
   EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.CountArrayItems(kTestNS, "Simple"); }), kXMPErr_BadXPath);
@@ -184,9 +167,7 @@ TEST_F(XMPProperties, StructureItemsCanBeInsertedAnywhere) {
   EXPECT_EQ(Get(meta, kTestNS, "People[1]/ovt:Name"), "first");
   EXPECT_EQ(Get(meta, kTestNS, "People[2]/ovt:Name"), "second");
   EXPECT_EQ(Get(meta, kTestNS, "People[3]/ovt:Name"), "third");
-  XMP_OptionBits options = 0;
-  meta.GetArrayItem(kTestNS, "People", 3, nullptr, &options);
-  EXPECT_TRUE(options & kXMP_PropValueIsStruct);
+  EXPECT_TRUE(meta.GetArrayItem(kTestNS, "People", 3)->options & kXMP_PropValueIsStruct);
   EXPECT_THROW(meta.SetArrayItem(kTestNS, "People", 1, "text", kXMP_PropValueIsStruct), XMP_Error);
 }
 
@@ -194,47 +175,40 @@ TEST_F(XMPProperties, StructFieldsAndQualifiers) {
   XMPMeta meta;
   meta.SetStructField(kTestNS, "Place", kXMP_NS_DC, "title", "Harbour");
   meta.SetStructField(kTestNS, "Place", kTestNS, "Code", "42");
-  std::string value;
-  XMP_OptionBits options = 0;
-  ASSERT_TRUE(meta.GetProperty(kTestNS, "Place", &value, &options));
-  EXPECT_TRUE(options & kXMP_PropValueIsStruct);
-  EXPECT_TRUE(meta.GetStructField(kTestNS, "Place", kXMP_NS_DC, "title", &value));
-  EXPECT_EQ(value, "Harbour");
+  EXPECT_TRUE(xmptest::OptionsOf(meta, kTestNS, "Place") & kXMP_PropValueIsStruct);
+  EXPECT_EQ(meta.GetStructField(kTestNS, "Place", kXMP_NS_DC, "title").value_or(XMP_Node()).value, "Harbour");
   EXPECT_EQ(Get(meta, kTestNS, "Place/ovt:Code"), "42");
-  EXPECT_FALSE(meta.GetStructField(kTestNS, "NoStruct", kXMP_NS_DC, "title", &value));
+  EXPECT_FALSE(meta.GetStructField(kTestNS, "NoStruct", kXMP_NS_DC, "title"));
   meta.SetProperty(kTestNS, "Plain", "p");
-  EXPECT_THROW(meta.GetStructField(kTestNS, "Plain", kXMP_NS_DC, "title", &value), XMP_Error);
+  EXPECT_THROW(meta.GetStructField(kTestNS, "Plain", kXMP_NS_DC, "title"), XMP_Error);
   EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.SetStructField(kTestNS, "Place", "http://ovra.test/unregistered/", "F", "v"); }), kXMPErr_BadSchema);
 
   meta.SetProperty(kTestNS, "Plain/?ovt:Unit", "mm");
-  EXPECT_TRUE(meta.GetProperty(kTestNS, "Plain/?ovt:Unit", &value, &options));
-  EXPECT_EQ(value, "mm");
-  EXPECT_TRUE(options & kXMP_PropIsQualifier);
+  const auto unit = meta.GetProperty(kTestNS, "Plain/?ovt:Unit");
+  ASSERT_TRUE(unit);
+  EXPECT_EQ(unit->value, "mm");
+  EXPECT_TRUE(unit->options & kXMP_PropIsQualifier);
   EXPECT_EQ(Get(meta, kTestNS, "Plain"), "p");
 }
 
 TEST_F(XMPProperties, LocalizedTextFollowsXDefaultRules) {
   XMPMeta meta;
-  std::string lang, value;
-  EXPECT_FALSE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "x-default", &lang, &value));
+  const auto chosen = [&](const char* generic, const char* specific) {
+    return meta.GetLocalizedText(kXMP_NS_DC, "rights", generic, specific).value_or(XMP_LocalizedNode());
+  };
+  EXPECT_FALSE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "x-default"));
   meta.SetLocalizedText(kXMP_NS_DC, "rights", "", "x-default", "All rights reserved");
   meta.SetLocalizedText(kXMP_NS_DC, "rights", "de", "de-DE", "Alle Rechte vorbehalten");
   meta.SetLocalizedText(kXMP_NS_DC, "rights", "fr", "fr-FR", "Tous droits réservés");
-  XMP_OptionBits form = 0;
-  meta.GetProperty(kXMP_NS_DC, "rights", nullptr, &form);
-  EXPECT_TRUE(form & kXMP_PropArrayIsAltText);
+  EXPECT_TRUE(xmptest::OptionsOf(meta, kXMP_NS_DC, "rights") & kXMP_PropArrayIsAltText);
   // Specific match, generic match, then x-default.
-  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "de", "de-DE", &lang, &value));
-  EXPECT_EQ(lang, "de-DE");
-  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "fr", "fr-CA", &lang, &value));
-  EXPECT_EQ(value, "Tous droits réservés");
-  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "it-IT", &lang, &value));
-  EXPECT_EQ(lang, "x-default");
+  EXPECT_EQ(chosen("de", "de-DE").language, "de-DE");
+  EXPECT_EQ(chosen("fr", "fr-CA").value, "Tous droits réservés");
+  EXPECT_EQ(chosen("", "it-IT").language, "x-default");
   meta.DeleteLocalizedText(kXMP_NS_DC, "rights", "fr", "fr-FR");
-  ASSERT_TRUE(meta.GetLocalizedText(kXMP_NS_DC, "rights", "", "fr-FR", &lang, &value));
-  EXPECT_EQ(lang, "x-default");
+  EXPECT_EQ(chosen("", "fr-FR").language, "x-default");
   meta.AppendArrayItem(kTestNS, "Seq", kXMP_PropArrayIsOrdered, "x");
-  EXPECT_THROW(meta.GetLocalizedText(kTestNS, "Seq", "", "x-default", &lang, &value), XMP_Error);
+  EXPECT_THROW(meta.GetLocalizedText(kTestNS, "Seq", "", "x-default"), XMP_Error);
 }
 
 TEST_F(XMPProperties, CloneIsDeepAndEraseKeepsTheHandle) {
@@ -288,18 +262,17 @@ TEST_F(XMPProperties, MultiValueMarksCoverDescendantsAndClearBelow) {
 
 TEST_F(XMPProperties, PathsIntoNodesOfTheWrongKindFailQuietly) {
   XMPMeta meta = xmptest::Parse(xmptest::RealWorldPacket());
-  std::string value;
   testing::internal::CaptureStderr();
   // Rating is simple, creator an array, DerivedFrom a structure.
-  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.GetProperty(kXMP_NS_XMP, "Rating/xmp:Sub", &value); }), kXMPErr_BadXPath);
+  EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.GetProperty(kXMP_NS_XMP, "Rating/xmp:Sub"); }), kXMPErr_BadXPath);
   EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.DoesPropertyExist(kXMP_NS_XMP, "Rating[1]"); }), kXMPErr_BadXPath);
   EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.DeleteProperty(kXMP_NS_DC, "creator/dc:x"); }), kXMPErr_BadXPath);
   EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.SetProperty(kXMP_NS_XMP_MM, "DerivedFrom[1]", "v"); }), kXMPErr_BadXPath);
   EXPECT_EQ(xmptest::ErrorIdOf([&] { meta.SetProperty(kXMP_NS_DC, "missing[1]", "v"); }), kXMPErr_BadXPath);
   // Missing ancestors read as absent; a qualifier may sit on any node.
-  EXPECT_FALSE(meta.GetProperty(kXMP_NS_XMP, "Missing/xmp:Sub[2]/?xmp:Q", &value));
+  EXPECT_FALSE(meta.GetProperty(kXMP_NS_XMP, "Missing/xmp:Sub[2]/?xmp:Q"));
   EXPECT_FALSE(meta.DoesPropertyExist(kXMP_NS_DC, "creator[7]/?xmp:Q"));
-  EXPECT_FALSE(meta.GetProperty(kXMP_NS_XMP, "Rating/?xmp:Q", &value));
+  EXPECT_FALSE(meta.GetProperty(kXMP_NS_XMP, "Rating/?xmp:Q"));
   meta.DeleteProperty(kXMP_NS_XMP, "Missing/xmp:Sub");
   EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
   meta.SetProperty(kXMP_NS_XMP, "NewStruct/xmp:Field", "created");  // implicit structure
@@ -310,19 +283,18 @@ TEST_F(XMPProperties, OrdinaryOperationsPrintNothingOnStderr) {
   testing::internal::CaptureStderr();
   {
     XMPMeta meta = xmptest::Parse(xmptest::RealWorldPacket());
-    std::string value, lang;
-    meta.GetProperty(kXMP_NS_XMP, "Missing", &value);
-    meta.GetProperty("http://ovra.test/unregistered/", "X", &value);
+    meta.GetProperty(kXMP_NS_XMP, "Missing");
+    meta.GetProperty("http://ovra.test/unregistered/", "X");
     meta.DoesPropertyExist("http://ovra.test/unregistered/", "X");
     meta.DeleteProperty("http://ovra.test/unregistered/", "X");
     meta.DeleteProperty(kXMP_NS_XMP, "Missing");
-    meta.GetArrayItem(kXMP_NS_DC, "missing", 1, &value);
-    meta.GetArrayItem(kXMP_NS_DC, "creator", 9, &value);
+    meta.GetArrayItem(kXMP_NS_DC, "missing", 1);
+    meta.GetArrayItem(kXMP_NS_DC, "creator", 9);
     meta.CountArrayItems(kXMP_NS_DC, "subject");
-    meta.GetStructField(kXMP_NS_XMP_MM, "Missing", kXMP_NS_XMP_ResourceRef, "documentID", &value);
-    meta.GetStructField(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "missing", &value);
-    meta.GetLocalizedText(kXMP_NS_DC, "missing", "", "x-default", &lang, &value);
-    meta.GetLocalizedText(kXMP_NS_DC, "title", "", "it-IT", &lang, &value);
+    meta.GetStructField(kXMP_NS_XMP_MM, "Missing", kXMP_NS_XMP_ResourceRef, "documentID");
+    meta.GetStructField(kXMP_NS_XMP_MM, "DerivedFrom", kXMP_NS_XMP_ResourceRef, "missing");
+    meta.GetLocalizedText(kXMP_NS_DC, "missing", "", "x-default");
+    meta.GetLocalizedText(kXMP_NS_DC, "title", "", "it-IT");
     meta.SetProperty(kXMP_NS_XMP, "Label", "New");
     meta.SetLocalizedText(kXMP_NS_DC, "title", "", "x-default", "T");
     meta.AppendArrayItem(kXMP_NS_DC, "subject", 0, "more");
@@ -330,7 +302,8 @@ TEST_F(XMPProperties, OrdinaryOperationsPrintNothingOnStderr) {
     meta.DeleteArrayItem(kXMP_NS_DC, "missing", 1);
     meta.DeleteLocalizedText(kXMP_NS_DC, "title", "", "it-IT");
     XMPIterator all(meta);
-    while (all.Next(&value, &lang)) {
+    std::string ns, path;
+    while (all.Next(&ns, &path)) {
     }
     XMPIterator none(meta, "http://ovra.test/unregistered/");
     none.Next();

@@ -45,9 +45,12 @@ std::int32_t ErrorIdOf(Call&& call) {
 }
 
 inline std::string Get(const ovraxmp::XMPMeta& meta, const std::string& ns, const std::string& path) {
-  std::string value;
-  if (!meta.GetProperty(ns, path, &value)) return "<absent>";
-  return value;
+  const auto node = meta.GetProperty(ns, path);
+  return node ? node->value : "<absent>";
+}
+
+inline ovraxmp::XMP_OptionBits OptionsOf(const ovraxmp::XMPMeta& meta, const std::string& ns, const std::string& path) {
+  return meta.GetProperty(ns, path).value_or(ovraxmp::XMP_Node()).options;
 }
 
 }  // namespace xmptest

@@ -33,7 +33,7 @@ TEST(XMPThreads, EightThreadsOnTheirOwnPacketsAndOneSharedHandle) {
           XMPMeta member = own.Clone();
           XMPUtils::MultiFileDistribute(aggregate, &member);
           std::string value, text;
-          if (!own.GetProperty(ns, "Round", &value) || value != std::to_string(round)) ++failures;
+          if (xmptest::Get(own, ns, "Round") != std::to_string(round)) ++failures;
           if (!aggregate.IsMultiValued(ns, "Round") || !own.IsMultiValued(ns, "Round")) ++failures;
           text = XMPUtils::CatenateArrayItems(own, kXMP_NS_DC, "subject", "; ", "\"", 0);
           XMPUtils::SeparateArrayItems(&member, kXMP_NS_DC, "subject", 0, text);

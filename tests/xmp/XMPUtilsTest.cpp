@@ -22,9 +22,7 @@ std::vector<std::string> Items(const XMPMeta& meta, const std::string& ns, const
   std::vector<std::string> items;
   const XMP_Index count = meta.CountArrayItems(ns, array);
   for (XMP_Index i = 1; i <= count; ++i) {
-    std::string item;
-    meta.GetArrayItem(ns, array, i, &item);
-    items.push_back(item);
+    items.push_back(meta.GetArrayItem(ns, array, i).value_or(XMP_Node()).value);
   }
   return items;
 }
@@ -74,16 +72,12 @@ TEST_F(XMPUtilsTest, SeparateSplitsTrimsHonoursQuotesAndReplacesItems) {
   XMPUtils::SeparateArrayItems(&meta, kTestNS, "Seq", kXMP_PropArrayIsOrdered,
                                "  one ;two;\"th;ree\" ; \"a \"\"q\"\"\"; x,y ;; ");
   EXPECT_EQ(Items(meta, kTestNS, "Seq"), (std::vector<std::string>{"one", "two", "th;ree", "a \"q\"", "x,y"}));
-  XMP_OptionBits form = 0;
-  meta.GetProperty(kTestNS, "Seq", nullptr, &form);
-  EXPECT_TRUE(form & kXMP_PropArrayIsOrdered);
+  EXPECT_TRUE(xmptest::OptionsOf(meta, kTestNS, "Seq") & kXMP_PropArrayIsOrdered);
   XMPUtils::SeparateArrayItems(&meta, kTestNS, "Seq", kXMPUtil_AllowCommas, "x,y; z");
   EXPECT_EQ(Items(meta, kTestNS, "Seq"), (std::vector<std::string>{"x", "y", "z"}));
-  meta.GetProperty(kTestNS, "Seq", nullptr, &form);
-  EXPECT_TRUE(form & kXMP_PropArrayIsOrdered);  // an existing array keeps its form
+  EXPECT_TRUE(xmptest::OptionsOf(meta, kTestNS, "Seq") & kXMP_PropArrayIsOrdered);  // an existing array keeps its form
   XMPUtils::SeparateArrayItems(&meta, kTestNS, "Bag", 0, "b");
-  meta.GetProperty(kTestNS, "Bag", nullptr, &form);
-  EXPECT_EQ(form & kXMP_PropArrayFormMask, kXMP_PropValueIsArray);
+  EXPECT_EQ(xmptest::OptionsOf(meta, kTestNS, "Bag") & kXMP_PropArrayFormMask, kXMP_PropValueIsArray);
   XMPUtils::SeparateArrayItems(&meta, kTestNS, "Seq", 0, "");
   EXPECT_EQ(meta.CountArrayItems(kTestNS, "Seq"), 0);
 }
@@ -172,9 +166,8 @@ TEST_F(XMPUtilsTest, AppendPropertiesMergesReplacesAndDeletesEmpty) {
   EXPECT_EQ(dest.CountArrayItems(kXMP_NS_DC, "subject"), 3);
   EXPECT_EQ(Get(dest, kXMP_NS_XMP_MM, "History[1]/stEvt:action"), "created");
   EXPECT_FALSE(dest.DoesPropertyExist(kTestNS, "Empty"));
-  std::string lang, value;
-  ASSERT_TRUE(dest.GetLocalizedText(kXMP_NS_DC, "title", "", "de-CH", &lang, &value));
-  EXPECT_EQ(value, "See in der Dämmerung");
+  ASSERT_TRUE(dest.GetLocalizedText(kXMP_NS_DC, "title", "", "de-CH"));
+  EXPECT_EQ(dest.GetLocalizedText(kXMP_NS_DC, "title", "", "de-CH")->value, "See in der Dämmerung");
 }
 
 TEST_F(XMPUtilsTest, DuplicateSubtreeCopiesAndRemovePropertiesRemoves) {

@@ -173,15 +173,13 @@ std::string WrapBareRDF(const char* buffer, std::size_t length) {
 }
 
 // Typed reads are text reads plus the toolkit's conversion; a text that does
-// not convert raises bad-value and leaves the output untouched.
-template <class T, class Convert>
-bool GetConverted(const XMPMeta& meta, const std::string& ns, const std::string& name, T* value,
-                  XMP_OptionBits* options, Convert convert) {
-  std::string text;
-  if (!meta.GetProperty(ns, name, &text, options)) return false;
-  const T converted = convert(text);
-  if (value) *value = converted;
-  return true;
+// not convert raises bad-value.
+template <class Convert>
+auto GetConverted(const XMPMeta& meta, const std::string& ns, const std::string& name, Convert convert)
+    -> std::optional<decltype(convert(std::string()))> {
+  const std::optional<XMP_Node> node = meta.GetProperty(ns, name);
+  if (!node) return std::nullopt;
+  return convert(node->value);
 }
 
 }  // namespace
@@ -532,27 +530,24 @@ void XMPMeta::Erase() {
 
 // ---- simple properties ----
 
-bool XMPMeta::GetProperty(const std::string& nsIn, const std::string& nameIn, std::string* value,
-                          XMP_OptionBits* options) const {
+std::optional<XMP_Node> XMPMeta::GetProperty(const std::string& nsIn, const std::string& nameIn) const {
   std::string aliasNS, aliasPath;
   const bool aliased = ResolveArrayAlias(nsIn, nameIn, true, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
   const std::string& name = aliased ? aliasPath : nameIn;
   XMPPacket& packet = detail::Require(mRef);
   XmpPtr xmp = packet.Xmp();
-  if (!detail::NamespaceKnown(packet, ns)) return false;
+  if (!detail::NamespaceKnown(packet, ns)) return std::nullopt;
   char missing = 0;
   CheckAncestors(xmp, ns, name, &missing);
-  if (missing) return false;
+  if (missing) return std::nullopt;
   XmpString text;
   std::uint32_t bits = 0;
   if (!xmp_get_property(xmp, ns.c_str(), name.c_str(), text, &bits)) {
     if (xmp_get_error() != 0) Fail("reading", ns, name);
-    return false;
+    return std::nullopt;
   }
-  if (value) value->assign(xmp_string_cstr(text), xmp_string_len(text));
-  if (options) *options = bits;
-  return true;
+  return XMP_Node{text.str(), bits};
 }
 
 void XMPMeta::SetProperty(const std::string& nsIn, const std::string& nameIn, const std::string& value,
@@ -604,28 +599,20 @@ bool XMPMeta::DoesPropertyExist(const std::string& nsIn, const std::string& name
 
 // ---- typed ----
 
-bool XMPMeta::GetProperty_Bool(const std::string& ns, const std::string& name, bool* value,
-                               XMP_OptionBits* options) const {
-  return GetConverted(*this, ns, name, value, options,
-                      [](const std::string& text) { return XMPUtils::ConvertToBool(text); });
+std::optional<bool> XMPMeta::GetProperty_Bool(const std::string& ns, const std::string& name) const {
+  return GetConverted(*this, ns, name, [](const std::string& text) { return XMPUtils::ConvertToBool(text); });
 }
 
-bool XMPMeta::GetProperty_Int(const std::string& ns, const std::string& name, std::int32_t* value,
-                              XMP_OptionBits* options) const {
-  return GetConverted(*this, ns, name, value, options,
-                      [](const std::string& text) { return XMPUtils::ConvertToInt(text); });
+std::optional<std::int32_t> XMPMeta::GetProperty_Int(const std::string& ns, const std::string& name) const {
+  return GetConverted(*this, ns, name, [](const std::string& text) { return XMPUtils::ConvertToInt(text); });
 }
 
-bool XMPMeta::GetProperty_Int64(const std::string& ns, const std::string& name, std::int64_t* value,
-                                XMP_OptionBits* options) const {
-  return GetConverted(*this, ns, name, value, options,
-                      [](const std::string& text) { return XMPUtils::ConvertToInt64(text); });
+std::optional<std::int64_t> XMPMeta::GetProperty_Int64(const std::string& ns, const std::string& name) const {
+  return GetConverted(*this, ns, name, [](const std::string& text) { return XMPUtils::ConvertToInt64(text); });
 }
 
-bool XMPMeta::GetProperty_Float(const std::string& ns, const std::string& name, double* value,
-                                XMP_OptionBits* options) const {
-  return GetConverted(*this, ns, name, value, options,
-                      [](const std::string& text) { return XMPUtils::ConvertToFloat(text); });
+std::optional<double> XMPMeta::GetProperty_Float(const std::string& ns, const std::string& name) const {
+  return GetConverted(*this, ns, name, [](const std::string& text) { return XMPUtils::ConvertToFloat(text); });
 }
 
 void XMPMeta::SetProperty_Bool(const std::string& ns, const std::string& name, bool value,
@@ -665,8 +652,8 @@ void XMPMeta::SetProperty_Date(const std::string& ns, const std::string& name, c
 
 // ---- arrays ----
 
-bool XMPMeta::GetArrayItem(const std::string& nsIn, const std::string& arrayNameIn, XMP_Index index,
-                           std::string* value, XMP_OptionBits* options) const {
+std::optional<XMP_Node> XMPMeta::GetArrayItem(const std::string& nsIn, const std::string& arrayNameIn,
+                                              XMP_Index index) const {
   std::string aliasNS, aliasPath;
   const bool aliased = ResolveArrayAlias(nsIn, arrayNameIn, false, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
@@ -675,16 +662,14 @@ bool XMPMeta::GetArrayItem(const std::string& nsIn, const std::string& arrayName
   CheckIndex(index);
   bool exists = false;
   RequireArray(xmp, ns, arrayName, &exists);
-  if (!exists) return false;
+  if (!exists) return std::nullopt;
   XmpString text;
   std::uint32_t bits = 0;
   if (!xmp_get_array_item(xmp, ns.c_str(), arrayName.c_str(), index, text, &bits)) {
     if (xmp_get_error() != 0) Fail("reading an item of", ns, arrayName);
-    return false;
+    return std::nullopt;
   }
-  if (value) *value = text.str();
-  if (options) *options = bits;
-  return true;
+  return XMP_Node{text.str(), bits};
 }
 
 void XMPMeta::SetArrayItem(const std::string& nsIn, const std::string& arrayNameIn, XMP_Index index,
@@ -790,14 +775,13 @@ XMP_Index XMPMeta::CountArrayItems(const std::string& nsIn, const std::string& a
 
 // ---- struct fields and qualifiers ----
 
-bool XMPMeta::GetStructField(const std::string& ns, const std::string& structName, const std::string& fieldNS,
-                             const std::string& fieldName, std::string* value, XMP_OptionBits* options) const {
-  std::string path;
-  path = XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName);
+std::optional<XMP_Node> XMPMeta::GetStructField(const std::string& ns, const std::string& structName,
+                                                const std::string& fieldNS, const std::string& fieldName) const {
+  const std::string path = XMPUtils::ComposeStructFieldPath(ns, structName, fieldNS, fieldName);
   XMP_OptionBits parent = 0;
-  if (!NodeOptions(X(mRef), ns, structName, &parent)) return false;
+  if (!NodeOptions(X(mRef), ns, structName, &parent)) return std::nullopt;
   if (!(parent & kXMP_PropValueIsStruct)) detail::Throw(kXMPErr_BadXPath, "\"" + structName + "\" is not a structure");
-  return GetProperty(ns, path, value, options);
+  return GetProperty(ns, path);
 }
 
 void XMPMeta::SetStructField(const std::string& ns, const std::string& structName, const std::string& fieldNS,
@@ -812,9 +796,9 @@ void XMPMeta::SetStructField(const std::string& ns, const std::string& structNam
 
 // ---- localised text ----
 
-bool XMPMeta::GetLocalizedText(const std::string& nsIn, const std::string& altTextNameIn,
-                               const std::string& genericLang, const std::string& specificLang,
-                               std::string* actualLang, std::string* itemValue, XMP_OptionBits* options) const {
+std::optional<XMP_LocalizedNode> XMPMeta::GetLocalizedText(const std::string& nsIn, const std::string& altTextNameIn,
+                                                           const std::string& genericLang,
+                                                           const std::string& specificLang) const {
   std::string aliasNS, aliasPath;
   const bool aliased = ResolveArrayAlias(nsIn, altTextNameIn, false, &aliasNS, &aliasPath);
   const std::string& ns = aliased ? aliasNS : nsIn;
@@ -822,7 +806,7 @@ bool XMPMeta::GetLocalizedText(const std::string& nsIn, const std::string& altTe
   XmpPtr xmp = X(mRef);
   if (specificLang.empty()) detail::Throw(kXMPErr_BadParam, "empty specific language");
   XMP_OptionBits form = 0;
-  if (!NodeOptions(xmp, ns, altTextName, &form)) return false;
+  if (!NodeOptions(xmp, ns, altTextName, &form)) return std::nullopt;
   if (!(form & kXMP_PropArrayIsAlternate) && !(form & kXMP_PropArrayIsAltText))
     detail::Throw(kXMPErr_BadXPath, "\"" + altTextName + "\" is not a language alternative");
   XmpString lang, text;
@@ -830,12 +814,9 @@ bool XMPMeta::GetLocalizedText(const std::string& nsIn, const std::string& altTe
   if (!xmp_get_localized_text(xmp, ns.c_str(), altTextName.c_str(), genericLang.c_str(), specificLang.c_str(),
                               lang, text, &bits)) {
     if (xmp_get_error() != 0) Fail("reading localised", ns, altTextName);
-    return false;
+    return std::nullopt;
   }
-  if (actualLang) *actualLang = lang.str();
-  if (itemValue) *itemValue = text.str();
-  if (options) *options = bits;
-  return true;
+  return XMP_LocalizedNode{lang.str(), text.str(), bits};
 }
 
 void XMPMeta::SetLocalizedText(const std::string& nsIn, const std::string& altTextNameIn,
@@ -865,8 +846,7 @@ void XMPMeta::DeleteLocalizedText(const std::string& nsIn, const std::string& al
   XmpPtr xmp = W(mRef);
   XMP_OptionBits form = 0;
   if (!NodeOptions(xmp, ns, altTextName, &form) || !(form & kXMP_PropArrayIsAlternate)) return;
-  std::string lang;
-  if (!GetLocalizedText(ns, altTextName, genericLang, specificLang, &lang, nullptr, nullptr)) return;
+  if (!GetLocalizedText(ns, altTextName, genericLang, specificLang)) return;
   if (!xmp_delete_localized_text(xmp, ns.c_str(), altTextName.c_str(), genericLang.c_str(), specificLang.c_str()))
     Fail("deleting localised", ns, altTextName);
 }

@@ -85,8 +85,7 @@ void DistributeLanguages(const XMPPacket& packet, XMPMeta& member, const std::st
   const XMPMeta& before = baseline.Meta();
   detail::Node old;
   detail::ReadNode(before, ns, path, &old);
-  XMP_OptionBits options = 0;
-  if (member.GetProperty(ns, path, nullptr, &options) && !(options & kXMP_PropArrayIsAltText)) return;
+  if (const auto stored = member.GetProperty(ns, path); stored && !(stored->options & kXMP_PropArrayIsAltText)) return;
   for (const detail::Node& item : node.children) {
     const std::string language = Language(item);
     const auto same = std::find_if(old.children.begin(), old.children.end(), [&](const detail::Node& o) {
@@ -114,8 +113,8 @@ void DistributeNode(const XMPMeta& aggregate, const XMPPacket& packet, XMPMeta& 
     detail::WriteNode(member, ns, path, node);
     return;
   }
-  XMP_OptionBits options = 0;
-  if (!member.GetProperty(ns, path, nullptr, &options) || !(options & kXMP_PropValueIsStruct)) {
+  const auto existing = member.GetProperty(ns, path);
+  if (!existing || !(existing->options & kXMP_PropValueIsStruct)) {
     member.DeleteProperty(ns, path);
     member.SetProperty(ns, path, std::string(), kXMP_PropValueIsStruct);
   }
@@ -132,8 +131,8 @@ void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_O
   // as a change.
   detail::Require(target.GetInternalRef()).TrackChanges(XMPPacket::Tracking::kNone);
   detail::Require(source.GetInternalRef());
-  std::string countText;
-  if (!target.GetProperty(kXMP_NS_Transient, kMultiFileCount, &countText)) {
+  const auto counted = target.GetProperty(kXMP_NS_Transient, kMultiFileCount);
+  if (!counted) {
     for (const auto& entry : PropertiesByKey(source)) {
       detail::Node node;
       if (detail::ReadNode(source, entry.first.first, entry.second.name, &node))
@@ -145,7 +144,7 @@ void XMPUtils::MultiFileCollect(XMPMeta* targetPtr, const XMPMeta& source, XMP_O
   }
   std::int64_t count = 1;
   try {
-    count = ConvertToInt64(countText);
+    count = ConvertToInt64(counted->value);
   } catch (const XMP_Error&) {
     // A foreign value in our own counter: restart the count, keep collecting.
   }
@@ -193,15 +192,16 @@ void XMPUtils::MultiFileDistribute(const XMPMeta& aggregate, XMPMeta* memberPtr,
   const XMP_Index records = aggregate.CountArrayItems(kXMP_NS_Transient, kDeletedProperties);
   for (XMP_Index i = 1; i <= records; ++i) {
     const std::string item = ComposeArrayItemPath(kXMP_NS_Transient, kDeletedProperties, i);
-    std::string uri, path;
-    XMP_OptionBits options = 0;
-    if (!aggregate.GetProperty(kXMP_NS_Transient, item, nullptr, &options) || !(options & kXMP_PropValueIsStruct))
-      continue;
-    if (!aggregate.GetStructField(kXMP_NS_Transient, item, kXMP_NS_Transient, "DelURI", &uri) ||
-        !aggregate.GetStructField(kXMP_NS_Transient, item, kXMP_NS_Transient, "DelPath", &path))
-      continue;
-    std::string prefix;
-    if (uri.empty() || path.empty() || !XMPMeta::GetNamespacePrefix(uri, &prefix)) continue;
+    const auto record = aggregate.GetProperty(kXMP_NS_Transient, item);
+    if (!record || !(record->options & kXMP_PropValueIsStruct)) continue;
+    const auto uriField = aggregate.GetStructField(kXMP_NS_Transient, item, kXMP_NS_Transient, "DelURI");
+    const auto pathField = aggregate.GetStructField(kXMP_NS_Transient, item, kXMP_NS_Transient, "DelPath");
+    if (!uriField || !pathField || uriField->value.empty() || pathField->value.empty()) continue;
+    const std::string& uri = uriField->value;
+    const std::string& path = pathField->value;
+    const auto registered = XMPMeta::GetNamespacePrefix(uri);
+    if (!registered) continue;
+    const std::string& prefix = *registered;
     // Only records whose path starts with the namespace's own prefix.
     if (path.compare(0, prefix.size(), prefix) != 0) continue;
     if (member.DoesPropertyExist(uri, path)) member.DeleteProperty(uri, path);

@@ -42,7 +42,10 @@ std::string ChildPath(const std::string& parentPath, const Node& child) {
 
 bool ReadNode(const XMPMeta& meta, const std::string& ns, const std::string& path, Node* node) {
   Node result;
-  if (!meta.GetProperty(ns, path, &result.value, &result.options)) return false;
+  const std::optional<XMP_Node> read = meta.GetProperty(ns, path);
+  if (!read) return false;
+  result.value = read->value;
+  result.options = read->options;
   result.ns = ns;
   if ((result.options & kXMP_PropCompositeMask) || (result.options & kXMP_PropHasQualifiers))
     ReadChildren(meta, ns, path, &result);

@@ -118,8 +118,10 @@ bool XMPMeta::RegisterNamespace(const std::string& namespaceURI,
   return WithoutColon(inUse) == bare;
 }
 
-bool XMPMeta::GetNamespacePrefix(const std::string& namespaceURI, std::string* prefix) {
-  return detail::LookupPrefix(namespaceURI, prefix);
+std::optional<std::string> XMPMeta::GetNamespacePrefix(const std::string& namespaceURI) {
+  std::string prefix;
+  if (!detail::LookupPrefix(namespaceURI, &prefix)) return std::nullopt;
+  return prefix;
 }
 
 std::string XMPMeta::GetVersionInfo() {

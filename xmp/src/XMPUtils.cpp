@@ -64,8 +64,9 @@ std::string XMPUtils::CatenateArrayItems(const XMPMeta& xmpObj, const std::strin
   detail::Require(xmpObj.GetInternalRef());
   const char open = quotes.empty() ? '"' : quotes[0];
   const char close = quotes.size() > 1 ? quotes[1] : open;
-  XMP_OptionBits form = 0;
-  if (!xmpObj.GetProperty(schemaNS, arrayName, nullptr, &form)) return std::string();
+  const auto array = xmpObj.GetProperty(schemaNS, arrayName);
+  if (!array) return std::string();
+  const XMP_OptionBits form = array->options;
   if (!(form & kXMP_PropValueIsArray) || (form & kXMP_PropArrayIsAlternate))
     detail::Throw(kXMPErr_BadParam, "\"" + arrayName + "\" is not an unordered or ordered array");
   std::string special = ";";
@@ -77,10 +78,9 @@ std::string XMPUtils::CatenateArrayItems(const XMPMeta& xmpObj, const std::strin
   const XMP_Index count = xmpObj.CountArrayItems(schemaNS, arrayName);
   std::string out;
   for (XMP_Index i = 1; i <= count; ++i) {
-    std::string item;
-    XMP_OptionBits itemOptions = 0;
-    xmpObj.GetArrayItem(schemaNS, arrayName, i, &item, &itemOptions);
-    if (itemOptions & kXMP_PropCompositeMask) detail::Throw(kXMPErr_BadParam, "array items must be simple");
+    const XMP_Node node = xmpObj.GetArrayItem(schemaNS, arrayName, i).value_or(XMP_Node());
+    const std::string& item = node.value;
+    if (node.options & kXMP_PropCompositeMask) detail::Throw(kXMPErr_BadParam, "array items must be simple");
     if (i > 1) out += separator;
     const bool quote = item.empty() || IsBlank(item.front()) || IsBlank(item.back()) ||
                        item.find_first_of(special) != std::string::npos;
@@ -140,7 +140,8 @@ void XMPUtils::SeparateArrayItems(XMPMeta* xmpObj, const std::string& schemaNS, 
   }
 
   XMP_OptionBits form = 0;
-  if (meta.GetProperty(schemaNS, arrayName, nullptr, &form)) {
+  if (const auto array = meta.GetProperty(schemaNS, arrayName)) {
+    form = array->options;
     if (!(form & kXMP_PropValueIsArray) || (form & kXMP_PropArrayIsAlternate))
       detail::Throw(kXMPErr_BadXPath, "\"" + arrayName + "\" is not an unordered or ordered array");
     for (XMP_Index i = meta.CountArrayItems(schemaNS, arrayName); i >= 1; --i)

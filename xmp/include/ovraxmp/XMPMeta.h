@@ -3,6 +3,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string>
 
 #include <ovrametadata/XMPMetaRef.h>
@@ -10,6 +11,21 @@
 #include <ovraxmp/XMPError.h>
 
 namespace ovraxmp {
+
+// A value read from a packet, with the bits that tell its kind
+// (kXMP_PropValueIsStruct, kXMP_PropArrayIsAltText, ...). Structures and
+// arrays have an empty value.
+struct XMP_Node {
+  std::string value;
+  XMP_OptionBits options = 0;
+};
+
+// The item of a language alternative that a choice of languages picked.
+struct XMP_LocalizedNode {
+  std::string language;
+  std::string value;
+  XMP_OptionBits options = 0;
+};
 
 // Called by the toolkit for internal assertions; the layer accepts and keeps
 // the registration (the underlying toolkit raises none).
@@ -55,10 +71,8 @@ class XMPMeta {
   void Erase();
 
   // ---- Properties (propName is a toolkit path relative to schemaNS) ----
-  // False when absent (value and options untouched); also false for an
-  // unregistered namespace. Composite nodes answer true with an empty value.
-  bool GetProperty(const std::string& schemaNS, const std::string& propName, std::string* propValue,
-                   XMP_OptionBits* options = nullptr) const;
+  // Nothing when absent, also for an unregistered namespace.
+  std::optional<XMP_Node> GetProperty(const std::string& schemaNS, const std::string& propName) const;
   // Creates or replaces the property; options with a composite bit create an
   // empty struct or array. Throws kXMPErr_BadSchema for an unregistered
   // namespace and kXMPErr_BadXPath for a text value on an existing struct or
@@ -69,16 +83,12 @@ class XMPMeta {
   void DeleteProperty(const std::string& schemaNS, const std::string& propName);
   bool DoesPropertyExist(const std::string& schemaNS, const std::string& propName) const;
 
-  // Typed forms. Getters answer false when absent and throw kXMPErr_BadValue
+  // Typed forms. Getters give nothing when absent and throw kXMPErr_BadValue
   // when the text does not convert; setters store the XMPUtils text form.
-  bool GetProperty_Bool(const std::string& schemaNS, const std::string& propName, bool* propValue,
-                        XMP_OptionBits* options = nullptr) const;
-  bool GetProperty_Int(const std::string& schemaNS, const std::string& propName,
-                       std::int32_t* propValue, XMP_OptionBits* options = nullptr) const;
-  bool GetProperty_Int64(const std::string& schemaNS, const std::string& propName,
-                         std::int64_t* propValue, XMP_OptionBits* options = nullptr) const;
-  bool GetProperty_Float(const std::string& schemaNS, const std::string& propName,
-                         double* propValue, XMP_OptionBits* options = nullptr) const;
+  std::optional<bool> GetProperty_Bool(const std::string& schemaNS, const std::string& propName) const;
+  std::optional<std::int32_t> GetProperty_Int(const std::string& schemaNS, const std::string& propName) const;
+  std::optional<std::int64_t> GetProperty_Int64(const std::string& schemaNS, const std::string& propName) const;
+  std::optional<double> GetProperty_Float(const std::string& schemaNS, const std::string& propName) const;
   void SetProperty_Bool(const std::string& schemaNS, const std::string& propName, bool propValue,
                         XMP_OptionBits options = 0);
   void SetProperty_Int(const std::string& schemaNS, const std::string& propName,
@@ -91,10 +101,10 @@ class XMPMeta {
                         const XMP_DateTime& propValue, XMP_OptionBits options = 0);
 
   // ---- Arrays (1-based indices; kXMP_ArrayLastItem = -1 is the last item) ----
-  // Absent array or item: false. A property that is not an array raises
+  // Absent array or item: nothing. A property that is not an array raises
   // kXMPErr_BadXPath; an index of 0 or below -1 raises kXMPErr_BadIndex.
-  bool GetArrayItem(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex,
-                    std::string* itemValue, XMP_OptionBits* options = nullptr) const;
+  std::optional<XMP_Node> GetArrayItem(const std::string& schemaNS, const std::string& arrayName,
+                                       XMP_Index itemIndex) const;
   // Replaces the item, or inserts a new one before or after it with
   // kXMP_InsertBeforeItem / kXMP_InsertAfterItem; index count+1 appends.
   void SetArrayItem(const std::string& schemaNS, const std::string& arrayName, XMP_Index itemIndex,
@@ -109,21 +119,19 @@ class XMPMeta {
 
   // ---- Struct fields and qualifiers ----
   // The field / qualifier namespace must be registered (kXMPErr_BadSchema).
-  bool GetStructField(const std::string& schemaNS, const std::string& structName,
-                      const std::string& fieldNS, const std::string& fieldName,
-                      std::string* fieldValue, XMP_OptionBits* options = nullptr) const;
+  std::optional<XMP_Node> GetStructField(const std::string& schemaNS, const std::string& structName,
+                                         const std::string& fieldNS, const std::string& fieldName) const;
   void SetStructField(const std::string& schemaNS, const std::string& structName,
                       const std::string& fieldNS, const std::string& fieldName,
                       const std::string& fieldValue, XMP_OptionBits options = 0);
 
   // ---- Localised text (language alternatives) ----
   // Chooses by the XMP rules: the specific language, else the first item of
-  // the generic language, else "x-default", else the first item. False when
+  // the generic language, else "x-default", else the first item. Nothing when
   // the property is absent or empty; kXMPErr_BadXPath when it is not alt-text.
-  bool GetLocalizedText(const std::string& schemaNS, const std::string& altTextName,
-                        const std::string& genericLang, const std::string& specificLang,
-                        std::string* actualLang, std::string* itemValue,
-                        XMP_OptionBits* options = nullptr) const;
+  std::optional<XMP_LocalizedNode> GetLocalizedText(const std::string& schemaNS, const std::string& altTextName,
+                                                    const std::string& genericLang,
+                                                    const std::string& specificLang) const;
   // Sets the item of specificLang (creating the alt-text array) and keeps
   // "x-default" in step as the XMP rules say.
   void SetLocalizedText(const std::string& schemaNS, const std::string& altTextName,
@@ -163,9 +171,9 @@ class XMPMeta {
   static bool RegisterNamespace(const std::string& namespaceURI,
                                 const std::string& suggestedPrefix,
                                 std::string* registeredPrefix);
-  // The prefix with trailing colon ("dc:"); false (prefix untouched) when
-  // the namespace is not registered.
-  static bool GetNamespacePrefix(const std::string& namespaceURI, std::string* prefix);
+  // The prefix with trailing colon ("dc:"); nothing when the namespace is
+  // not registered.
+  static std::optional<std::string> GetNamespacePrefix(const std::string& namespaceURI);
 
  private:
   XMPMetaRef mRef = nullptr;
