@@ -65,7 +65,7 @@ std::string PacketText(std::size_t bytes) {
   for (int i = 0;; ++i) {
     meta.SetProperty(kNS, "P" + std::to_string(i), std::string(60, 'a' + i % 26));
     if (i % 50 == 0) {
-      meta.SerializeToBuffer(&text, kXMP_OmitPacketWrapper);
+      text = meta.SerializeToBuffer(kXMP_OmitPacketWrapper);
       if (text.size() >= bytes) return text;
     }
   }
@@ -74,7 +74,7 @@ std::string PacketText(std::size_t bytes) {
 // The same packet for the layer and the raw calls: parsed from one text.
 XMPMeta ParsedTypicalPacket() {
   std::string text;
-  TypicalPacket(0).SerializeToBuffer(&text);
+  text = TypicalPacket(0).SerializeToBuffer();
   XMPMeta meta;
   meta.ParseFromBuffer(text);
   return meta;
@@ -94,7 +94,7 @@ BENCHMARK(BM_GetProperty_Layer);
 void BM_GetProperty_Raw(benchmark::State& state) {
   XMPMeta meta = TypicalPacket(0);
   std::string text;
-  meta.SerializeToBuffer(&text);
+  text = meta.SerializeToBuffer();
   XmpPtr xmp = xmp_new(text.data(), text.size());
   std::string value;
   for (auto _ : state) {
@@ -122,7 +122,7 @@ BENCHMARK(BM_GetPropertyInt_Layer);
 void BM_GetPropertyInt_Raw(benchmark::State& state) {
   XMPMeta meta = TypicalPacket(0);
   std::string text;
-  meta.SerializeToBuffer(&text);
+  text = meta.SerializeToBuffer();
   XmpPtr xmp = xmp_new(text.data(), text.size());
   int32_t value = 0;
   for (auto _ : state) {
@@ -201,7 +201,7 @@ void BM_Serialize_Layer(benchmark::State& state) {
   meta.ParseFromBuffer(PacketText(static_cast<std::size_t>(state.range(0))));
   std::string out;
   for (auto _ : state) {
-    meta.SerializeToBuffer(&out);
+    out = meta.SerializeToBuffer();
     benchmark::DoNotOptimize(out);
   }
 }

@@ -42,7 +42,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     for (int i = 0; i < 1000 && it.Next(&ns, &path, &value, &options); ++i) {
     }
     std::string out;
-    meta.SerializeToBuffer(&out);
+    out = meta.SerializeToBuffer();
   } catch (const ovraxmp::XMP_Error&) {
     // Refusing bad input is the expected outcome.
   }

@@ -55,8 +55,7 @@ void BufferProviderImpl::WriteChanges(const std::vector<Path>& paths) {
   if (!xmp) return;
   try {
     const ovraxmp::XMPMeta meta(xmp);
-    std::string serialized;
-    meta.SerializeToBuffer(&serialized, 0, 0, "", "", 0);
+    const std::string serialized = meta.SerializeToBuffer();
     WriteBuffer(paths, serialized.data(), serialized.size());
   } catch (...) {
     // Write-back runs from a guard's destructor and must not throw; the

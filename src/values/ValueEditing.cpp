@@ -280,10 +280,9 @@ std::vector<Path> CopyValues(XMPMetaRef source, XMPMetaRef destination, const st
       ovraxmp::XMPMeta before, after;
       if (to.DoesPropertyExist(ns, name)) ovraxmp::XMPUtils::DuplicateSubtree(to, &before, ns, name, ns, name);
       ovraxmp::XMPUtils::DuplicateSubtree(from, &after, ns, name, ns, name);
-      std::string beforeText, afterText;
-      before.SerializeToBuffer(&beforeText, ovraxmp::kXMP_OmitPacketWrapper | ovraxmp::kXMP_UseCompactFormat);
-      after.SerializeToBuffer(&afterText, ovraxmp::kXMP_OmitPacketWrapper | ovraxmp::kXMP_UseCompactFormat);
-      if (beforeText == afterText && !to.IsMultiValued(ns, name)) continue;
+      constexpr auto kCompact = ovraxmp::kXMP_OmitPacketWrapper | ovraxmp::kXMP_UseCompactFormat;
+      if (before.SerializeToBuffer(kCompact) == after.SerializeToBuffer(kCompact) && !to.IsMultiValued(ns, name))
+        continue;
       to.DeleteProperty(ns, name);
       ovraxmp::XMPUtils::DuplicateSubtree(from, &to, ns, name, ns, name);
       to.ClearMultiValueInfo(ns, name);

@@ -95,7 +95,7 @@ ovraxmp::XMPMeta Packet(const std::string& properties) {
 
 std::string Serialize(XMPMetaRef xmp) {
   std::string out;
-  if (xmp) ovraxmp::XMPMeta(xmp).SerializeToBuffer(&out, ovraxmp::kXMP_OmitPacketWrapper);
+  if (xmp) out = ovraxmp::XMPMeta(xmp).SerializeToBuffer(ovraxmp::kXMP_OmitPacketWrapper);
   return out;
 }
 

@@ -22,7 +22,7 @@ TEST_F(XMPProperties, RealWorldPacketSurvivesSerialiseAndReparse) {
   const XMPMeta original = xmptest::Parse(xmptest::RealWorldPacket());
   for (const std::string& text : {xmptest::Serialize(original), [&] {
          std::string compact;
-         original.SerializeToBuffer(&compact, kXMP_UseCompactFormat | kXMP_OmitPacketWrapper);
+         compact = original.SerializeToBuffer(kXMP_UseCompactFormat | kXMP_OmitPacketWrapper);
          return compact;
        }()}) {
     const XMPMeta again = xmptest::Parse(text);
@@ -310,7 +310,7 @@ TEST_F(XMPProperties, OrdinaryOperationsPrintNothingOnStderr) {
     XMPIterator missing(meta, kXMP_NS_DC, "missing");
     missing.Next();
     std::string text;
-    meta.SerializeToBuffer(&text);
+    text = meta.SerializeToBuffer();
     meta.IsMultiValued(kXMP_NS_DC, "title");
   }
   EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
@@ -335,7 +335,7 @@ TEST_F(XMPProperties, TwoItemLanguageAlternativeKeepsItsOtherText) {
   expectTexts(meta, "parsed");
   expectTexts(meta.Clone(), "cloned");
   std::string exact;
-  meta.SerializeToBuffer(&exact, kXMP_ExactPacketLength, 4000);
+  exact = meta.SerializeToBuffer(kXMP_ExactPacketLength, 4000);
   EXPECT_EQ(exact.size(), 4000u);
   expectTexts(meta, "after serialising");
   expectTexts(xmptest::Parse(exact), "reparsed");

@@ -29,7 +29,7 @@ inline ovraxmp::XMPMeta Parse(const std::string& text) {
 
 inline std::string Serialize(const ovraxmp::XMPMeta& meta) {
   std::string out;
-  meta.SerializeToBuffer(&out, ovraxmp::kXMP_OmitPacketWrapper);
+  out = meta.SerializeToBuffer(ovraxmp::kXMP_OmitPacketWrapper);
   return out;
 }
 

@@ -38,7 +38,7 @@ TEST(XMPThreads, EightThreadsOnTheirOwnPacketsAndOneSharedHandle) {
           text = XMPUtils::CatenateArrayItems(own, kXMP_NS_DC, "subject", "; ", "\"", 0);
           XMPUtils::SeparateArrayItems(&member, kXMP_NS_DC, "subject", 0, text);
           if (member.CountArrayItems(kXMP_NS_DC, "subject") != 3) ++failures;
-          member.SerializeToBuffer(&text);
+          text = member.SerializeToBuffer();
           XMPMetaRefRelease(sharedRef);
         }
       } catch (const std::exception&) {

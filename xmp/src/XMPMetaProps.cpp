@@ -485,9 +485,8 @@ void XMPMeta::ParseFromBuffer(const std::string& buffer, XMP_OptionBits options)
   ParseFromBuffer(buffer.data(), buffer.size(), options);
 }
 
-void XMPMeta::SerializeToBuffer(std::string* out, XMP_OptionBits options, std::uint32_t padding,
-                                const std::string& newline, const std::string& indent,
-                                std::int32_t baseIndent) const {
+std::string XMPMeta::SerializeToBuffer(XMP_OptionBits options, std::uint32_t padding, const std::string& newline,
+                                       const std::string& indent, std::int32_t baseIndent) const {
   XmpPtr xmp = X(mRef);
   XmpPtr toWrite = xmp;
   // Transient data stays in memory: write a copy without it.
@@ -500,12 +499,13 @@ void XMPMeta::SerializeToBuffer(std::string* out, XMP_OptionBits options, std::u
       XMPMeta copy(detail::NewPacket(toWrite));
       XMPMetaRefRelease(copy.GetInternalRef());  // the holder keeps the only reference
       XMPUtils::RemoveProperties(&copy, kXMP_NS_Transient, std::string(), kXMPUtil_DoAllProperties);
-      copy.SerializeToBuffer(out, options, padding, newline, indent, baseIndent);
-      return;
+      return copy.SerializeToBuffer(options, padding, newline, indent, baseIndent);
     }
   }
-  if (!detail::Serialize(toWrite, out, options, padding, newline, indent, baseIndent))
+  std::string out;
+  if (!detail::Serialize(toWrite, &out, options, padding, newline, indent, baseIndent))
     detail::ThrowLastError(kXMPErr_BadSerialize, "serialising XMP");
+  return out;
 }
 
 XMPMeta XMPMeta::Clone(XMP_OptionBits) const {

@@ -61,10 +61,9 @@ class XMPMeta {
   // Serialises into *out (replaced). Empty newline/indent and zero padding
   // mean the toolkit defaults ("\n", three blanks, 2048 bytes of padding).
   // The transient namespace is never written.
-  void SerializeToBuffer(std::string* out, XMP_OptionBits options = 0, std::uint32_t padding = 0,
-                         const std::string& newline = std::string(),
-                         const std::string& indent = std::string(),
-                         std::int32_t baseIndent = 0) const;
+  std::string SerializeToBuffer(XMP_OptionBits options = 0, std::uint32_t padding = 0,
+                                const std::string& newline = std::string(),
+                                const std::string& indent = std::string(), std::int32_t baseIndent = 0) const;
   // A new packet with a deep copy of the properties and the multi-value marks.
   XMPMeta Clone(XMP_OptionBits options = 0) const;
   // Removes every property and mark; the handle stays the same packet.

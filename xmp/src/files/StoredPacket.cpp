@@ -63,8 +63,7 @@ std::vector<std::pair<Key, Fragment>> FragmentsOf(const XMPMeta& source, const s
   if (keys.empty()) return fragments;
   XMPMeta all;
   for (const Key& key : keys) CopyProperty(source, all, key);
-  std::string text;
-  all.SerializeToBuffer(&text, kXMP_OmitPacketWrapper);
+  const std::string text = all.SerializeToBuffer(kXMP_OmitPacketWrapper);
   PacketLayout layout;
   if (!ScanPacket(text, nullptr, &layout) || layout.descriptions.empty())
     throw XMP_Error(kXMPErr_BadSerialize, "cannot write the changed properties");
@@ -194,9 +193,7 @@ void StoredPacket::Apply(const XMPMeta& source, const std::vector<PropertyText>&
     XMPMeta whole = mPacket ? ParsedText(*mPacket) : XMPMeta();
     for (const Key& key : changed)
       if (!InExtension(key)) CopyProperty(source, whole, key);
-    std::string text;
-    whole.SerializeToBuffer(&text, 0, 0);
-    mWhole = std::move(text);
+    mWhole = whole.SerializeToBuffer();
     if (limit && mWhole->size() > *limit)
       throw XMP_Error(kXMPErr_TooLargeForJPEG, "the XMP packet would be larger than the file's format holds");
   } else if (limit) {
@@ -256,7 +253,7 @@ void StoredPacket::WriteExtension(const XMPMeta& source, const XMPMeta& stored) 
   for (const Key& key : mExtensionKeys) CopyProperty(Contains(mChanged, key) ? source : stored, extension, key);
   std::string text;
   if (!Properties(extension).empty()) {
-    extension.SerializeToBuffer(&text, kXMP_OmitPacketWrapper | kXMP_UseCompactFormat, 0);
+    text = extension.SerializeToBuffer(kXMP_OmitPacketWrapper | kXMP_UseCompactFormat, 0);
     // The packet names the toolkit that wrote it; readers that join the two
     // parts would take the extension's name for the packet's.
     const std::size_t toolkit = text.find(" x:xmptk=\"");
@@ -291,10 +288,9 @@ std::vector<std::string> StoredPacket::Candidates() const {
     if (mEditor) {
       if (auto same = Render(mPacket->size())) candidates.push_back(std::move(*same));
     } else {
-      std::string same;
       try {
-        ParsedText(*mWhole).SerializeToBuffer(&same, kXMP_ExactPacketLength, static_cast<std::uint32_t>(mPacket->size()));
-        candidates.push_back(std::move(same));
+        candidates.push_back(
+            ParsedText(*mWhole).SerializeToBuffer(kXMP_ExactPacketLength, static_cast<std::uint32_t>(mPacket->size())));
       } catch (const XMP_Error&) {
         // Too long for the old place: the grown packet below.
       }
