@@ -20,6 +20,7 @@
 
 #include <ovrametadata/ovrametadata.h>
 
+#include "Files.h"
 #include "Lists.h"
 #include "Names.h"
 #include "Parallel.h"
@@ -228,6 +229,15 @@ bool IsExistingPath(const std::string& argument) {
   return std::filesystem::exists(argument, error);
 }
 
+// The files of a command, with folders and lists (see ExpandFiles); what
+// cannot be taken is reported.
+std::vector<std::string> FilesOf(const std::vector<std::string>& given, Reporter& reporter) {
+  std::vector<std::string> problems;
+  std::vector<std::string> files = ExpandFiles(given, problems);
+  for (const auto& problem : problems) reporter.Error("", problem, kExitUsage);
+  return files;
+}
+
 // ---------------------------------------------------------------------------
 // Printing
 
@@ -409,9 +419,14 @@ Session::~Session() {
 // ---------------------------------------------------------------------------
 // show
 
-int ShowCommand(const std::vector<std::string>& files, bool each, const std::string& viewName,
+int ShowCommand(const std::vector<std::string>& given, bool each, const std::string& viewName,
                 const std::string& fieldList) {
   Reporter reporter;
+  const std::vector<std::string> files = FilesOf(given, reporter);
+  if (files.empty()) {
+    if (reporter.status() == kExitSuccess) reporter.Error("", "show: no file found", kExitUsage);
+    return reporter.status();
+  }
   std::vector<Path> fieldPaths;
   if (!fieldList.empty() && !ReadFieldList(fieldList, fieldPaths)) return kExitUsage;
   const std::vector<Path>* fields = fieldList.empty() ? nullptr : &fieldPaths;
@@ -486,8 +501,9 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
   std::vector<std::string> files;
   std::vector<std::string> nameTexts;
   SplitArguments(arguments, files, nameTexts);
+  files = FilesOf(files, reporter);
   if (files.empty()) {
-    reporter.Error("", "get: no file given", kExitUsage);
+    if (reporter.status() == kExitSuccess) reporter.Error("", "get: no file given", kExitUsage);
     return reporter.status();
   }
   if (nameTexts.empty() && !options.json) {
@@ -632,8 +648,9 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
   std::vector<std::string> files;
   std::vector<std::string> assignmentTexts;
   SplitArguments(arguments, files, assignmentTexts);
+  files = FilesOf(files, reporter);
   if (files.empty()) {
-    reporter.Error("", "set: no file given", kExitUsage);
+    if (reporter.status() == kExitSuccess) reporter.Error("", "set: no file given", kExitUsage);
     return reporter.status();
   }
   if (assignmentTexts.empty() && deletes.empty()) {

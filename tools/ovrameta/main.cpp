@@ -9,6 +9,7 @@
 #include <ovrametadata/MetadataUtils.h>
 
 #include "Commands.h"
+#include "Files.h"
 #include "Lists.h"
 #include "Parallel.h"
 #include "ViewShow.h"
@@ -47,11 +48,27 @@ int main(int argc, char** argv) {
       "Exit status: 0 success, 1 a named value is absent, 2 usage error or a file that cannot\n"
       "be read or written.");
 
+  // Every command that takes files walks folders and reads lists alike.
+  ovrameta::FileOptions fileOptions;
+  const auto takesFiles = [&](CLI::App* command) {
+    auto* recursive =
+        command->add_flag("-r,--recursive", fileOptions.recursive, "Take the files below the folders given");
+    command->add_option("--ext", fileOptions.extensions, "Only these endings from folders: jpg,mp4")
+        ->allow_extra_args(false)
+        ->delimiter(',')
+        ->needs(recursive);
+    command->add_option("-@,--files-from", fileOptions.lists,
+                        "Also the files named in FILE, one a line (- for standard input)")
+        ->allow_extra_args(false);
+  };
+
   std::vector<std::string> showFiles;
   bool each = false;
   auto* show = app.add_subcommand(
       "show", "Show every value: of one file, or of several files as one aggregate");
-  show->add_option("FILE", showFiles, "Media files")->required();
+  // Required unless a list names them (checked after parsing).
+  show->add_option("FILE", showFiles, "Media files or, with -r, folders");
+  takesFiles(show);
   show->add_flag("--each", each, "Show several files one by one instead of as an aggregate");
   std::string viewName;
   show->add_option("--view", viewName, "Show the values as this view lays them out (see views)");
@@ -62,6 +79,7 @@ int main(int argc, char** argv) {
   ovrameta::GetOptions getOptions;
   auto* get = app.add_subcommand("get", "Show the display value of named properties");
   get->add_option("ARGS", getArguments, "FILE... NAME...")->required();
+  takesFiles(get);
   get->add_flag("--raw", getOptions.raw, "The stored text instead of the display value");
   get->add_flag("--json", getOptions.json,
                 "Machine-readable output with types (all properties when no NAME is given)");
@@ -70,6 +88,7 @@ int main(int argc, char** argv) {
   std::vector<std::string> deletes;
   auto* set = app.add_subcommand("set", "Write values, checked against the definitions");
   set->add_option("ARGS", setArguments, "FILE... NAME=VALUE...")->required();
+  takesFiles(set);
   set->add_option("--delete", deletes, "Delete the value of NAME")->expected(1, -1);
 
   std::vector<std::string> schemaPrefixes;
@@ -101,12 +120,14 @@ int main(int argc, char** argv) {
 
   try {
     app.parse(argc, argv);
+    if (*show && showFiles.empty() && fileOptions.lists.empty()) throw CLI::RequiredError("FILE");
   } catch (const CLI::ParseError& error) {
     const int status = app.exit(error);
     return status == 0 ? 0 : ovrameta::kExitUsage;
   }
 
   if (jobs != 0) ovrameta::SetJobs(jobs);
+  ovrameta::SetFileOptions(fileOptions);
   ovrameta::Session session;
   if (!session.ok()) return ovrameta::kExitUsage;
   // Packages may bring schemas, so every command loads them.
