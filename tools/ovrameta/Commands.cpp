@@ -380,7 +380,12 @@ void SplitArguments(const std::vector<std::string>& arguments, std::vector<std::
   for (const auto& argument : arguments) {
     const auto equals = argument.find('=');
     const std::string head = equals == std::string::npos ? argument : argument.substr(0, equals);
-    if (LooksLikeName(head) && !IsExistingPath(argument)) {
+    // Also names gone wrong, to be answered with the registered one:
+    // "title=x", and "title" when a property has that name.
+    const bool plain = head.find_first_of("/.") == std::string::npos;
+    const bool name =
+        LooksLikeName(head) || (plain && (equals != std::string::npos || !SuggestName(head).empty()));
+    if (name && !IsExistingPath(argument)) {
       names.push_back(argument);
     } else {
       files.push_back(argument);
@@ -518,7 +523,7 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
       reporter.Error("", Quoted(text) + ": get takes names, not assignments", kExitUsage);
     } else if (ResolveName(text, name, error)) {
       names.push_back(name);
-    } else if (!SchemaForPrefix(text.substr(0, text.find(':')))) {
+    } else if (!SchemaForPrefix(text.substr(0, text.find(':'))) && SuggestName(text).empty()) {
       // No definition: looked up by the prefix each file declares.
       name.name = name.label = text;
       names.push_back(name);

@@ -1,6 +1,7 @@
 // ovrameta: shows and edits the XMP metadata of media files through
 // ovrametadata, the way a host application does.
 #include <csignal>
+#include <filesystem>
 #include <iostream>
 #include <string>
 #include <vector>
@@ -11,6 +12,7 @@
 #include "Commands.h"
 #include "Files.h"
 #include "Lists.h"
+#include "Names.h"
 #include "Parallel.h"
 #include "ViewShow.h"
 
@@ -118,12 +120,33 @@ int main(int argc, char** argv) {
   auto* fields = app.add_subcommand("fields", "Write a path list of the fields below properties (for show --fields)");
   fields->add_option("NAME", fieldNames, "Properties")->required();
 
+  // ExifTool's tag arguments (-Title=x) would read as unknown options: they
+  // are taken out and answered once the schemas are loaded.
+  std::vector<std::string> exifToolForms;
+  std::vector<char*> arguments;
+  for (int i = 0; i < argc; ++i) {
+    // What follows "--" is taken as it is.
+    if (std::string(argv[i]) == "--") {
+      arguments.insert(arguments.end(), argv + i, argv + argc);
+      break;
+    }
+    std::error_code error;
+    if (i > 0 && argv[i][0] == '-' && ovrameta::IsExifToolForm(argv[i]) &&
+        !std::filesystem::exists(argv[i], error)) {
+      exifToolForms.push_back(argv[i]);
+    } else {
+      arguments.push_back(argv[i]);
+    }
+  }
   try {
-    app.parse(argc, argv);
+    app.parse(static_cast<int>(arguments.size()), arguments.data());
     if (*show && showFiles.empty() && fileOptions.lists.empty()) throw CLI::RequiredError("FILE");
   } catch (const CLI::ParseError& error) {
-    const int status = app.exit(error);
-    return status == 0 ? 0 : ovrameta::kExitUsage;
+    // Answering ExifTool's forms says more than the usage error they cause.
+    if (exifToolForms.empty() || error.get_exit_code() == 0) {
+      const int status = app.exit(error);
+      return status == 0 ? 0 : ovrameta::kExitUsage;
+    }
   }
 
   if (jobs != 0) ovrameta::SetJobs(jobs);
@@ -132,6 +155,17 @@ int main(int argc, char** argv) {
   if (!session.ok()) return ovrameta::kExitUsage;
   // Packages may bring schemas, so every command loads them.
   const auto problems = ovrameta::LoadViews(static_cast<bool>(*packages));
+  // Without the dash (Rating=3) the form is answered only when a property
+  // is close: the argument may be meant otherwise.
+  for (const std::string& argument : *get ? getArguments : setArguments) {
+    std::error_code error;
+    if ((*get || *set) && ovrameta::IsExifToolForm(argument) && !std::filesystem::exists(argument, error) &&
+        !ovrameta::ExifToolAnswer(argument).empty())
+      exifToolForms.push_back(argument);
+  }
+  for (const std::string& argument : exifToolForms)
+    std::cerr << "ovrameta: " << ovrameta::ExifToolAnswer(argument) << '\n';
+  if (!exifToolForms.empty()) return ovrameta::kExitUsage;
   if (*packages) return ovrameta::PackagesCommand(problems);
   if (*show) return ovrameta::ShowCommand(showFiles, each, viewName, fieldList);
   if (*recent) return ovrameta::RecentCommand(recentName, recentClear);
