@@ -506,10 +506,13 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
   std::vector<std::string> files;
   std::vector<std::string> nameTexts;
   SplitArguments(arguments, files, nameTexts);
-  files = FilesOf(files, reporter);
+  // Files that cannot be taken count in the exit status, not in the checks
+  // of what is asked: the other files are worked on.
+  Reporter listing;
+  files = FilesOf(files, listing);
   if (files.empty()) {
-    if (reporter.status() == kExitSuccess) reporter.Error("", "get: no file given", kExitUsage);
-    return reporter.status();
+    if (listing.status() == kExitSuccess) listing.Error("", "get: no file given", kExitUsage);
+    return listing.status();
   }
   if (nameTexts.empty() && !options.json) {
     reporter.Error("", "get: no property name given (prefix:Property), or use --json", kExitUsage);
@@ -628,6 +631,7 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
       });
   progress.Clear();
   if (options.json) std::cout << output.dump(2) << '\n';
+  reporter.Relay(listing);
   return reporter.status();
 }
 
@@ -653,10 +657,13 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
   std::vector<std::string> files;
   std::vector<std::string> assignmentTexts;
   SplitArguments(arguments, files, assignmentTexts);
-  files = FilesOf(files, reporter);
+  // Files that cannot be taken count in the exit status, not in the checks
+  // of what is asked: the other files are worked on.
+  Reporter listing;
+  files = FilesOf(files, listing);
   if (files.empty()) {
-    if (reporter.status() == kExitSuccess) reporter.Error("", "set: no file given", kExitUsage);
-    return reporter.status();
+    if (listing.status() == kExitSuccess) listing.Error("", "set: no file given", kExitUsage);
+    return listing.status();
   }
   if (assignmentTexts.empty() && deletes.empty()) {
     reporter.Error("", "set: nothing to do (give NAME=VALUE or --delete NAME)", kExitUsage);
@@ -826,6 +833,7 @@ int SetCommand(const std::vector<std::string>& arguments, const std::vector<std:
     std::cerr << "ovrameta: " << written << (written == 1 ? " file" : " files") << " written, " << failed
               << " not written" << std::endl;
   }
+  reporter.Relay(listing);
   return reporter.status();
 }
 

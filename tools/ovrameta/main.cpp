@@ -56,11 +56,13 @@ int main(int argc, char** argv) {
     auto* recursive =
         command->add_flag("-r,--recursive", fileOptions.recursive, "Take the files below the folders given");
     command->add_option("--ext", fileOptions.extensions, "Only these endings from folders: jpg,mp4")
+        ->type_name("EXT,...")
         ->allow_extra_args(false)
         ->delimiter(',')
         ->needs(recursive);
     command->add_option("-@,--files-from", fileOptions.lists,
                         "Also the files named in FILE, one a line (- for standard input)")
+        ->type_name("FILE")
         ->allow_extra_args(false);
   };
 
