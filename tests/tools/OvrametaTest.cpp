@@ -409,11 +409,57 @@ TEST_F(OvrametaTest, UsageErrorsExitWithTwo) {
   EXPECT_EQ(Run({"--help"}).status, 0);
 }
 
+TEST_F(OvrametaTest, FoldersAreWalkedWithROnlyAndListsAddTheirFiles) {
+  fs::create_directories(mDir / "shoot/day2");
+  fs::create_directories(mDir / "shoot/.cache");
+  Sample("harbour.jpg", "shoot/b.JPG");
+  Sample("interview.mp4", "shoot/day2/a.mp4");
+  Sample("ambience.wav", "shoot/c.wav");
+  Sample("harbour.jpg", "shoot/.cache/hidden.jpg");
+  Sample("harbour.jpg", "loose.jpg");
+  fs::create_directory_symlink("..", mDir / "shoot/day2/up");
+  const Result plain = Run({"get", "shoot", "loose.jpg", "dc:title"});
+  EXPECT_EQ(plain.status, 2);
+  EXPECT_EQ(plain.err, "ovrameta: shoot: is a folder (use -r to walk it)\n");
+  EXPECT_EQ(plain.out, "Harbour at dawn\n");
+  // Sorted, hidden and linked folders left out, explicit files always taken.
+  const Result walked = Run({"get", "-r", "--ext", "JPG,.mp4", "shoot", "loose.jpg", "dc:title"});
+  EXPECT_EQ(walked.status, 0) << walked.err;
+  EXPECT_EQ(walked.out, "shoot/b.JPG: dc:title = Harbour at dawn\nshoot/day2/a.mp4: dc:title = Harbour interview\n"
+                        "loose.jpg: dc:title = Harbour at dawn\n");
+
+  WriteFile(mDir / "list.txt", "loose.jpg\r\nshoot/c.wav\n\n");
+  EXPECT_EQ(Run({"show", "--files-from", "list.txt"}).status, 0);
+  ASSERT_EQ(Run({"set", "-r", "--ext", "mp4", "-@", "list.txt", "shoot", "xmp:Label=Picked"}).status, 0);
+  EXPECT_EQ(Run({"get", "-r", "shoot", "loose.jpg", "xmp:Label"}).out,
+            "shoot/b.JPG: xmp:Label = Selected\nshoot/c.wav: xmp:Label = Picked\n"
+            "shoot/day2/a.mp4: xmp:Label = Picked\nloose.jpg: xmp:Label = Picked\n");
+  EXPECT_EQ(Run({"get", "-@", "missing.txt", "loose.jpg", "dc:title"}).status, 2);
+}
+
+TEST_F(OvrametaTest, NamesAlmostRightAndExifToolsFormsAreAnsweredWithTheRegisteredName) {
+  Sample("harbour.jpg");
+  const std::pair<std::vector<std::string>, std::string> cases[] = {
+      {{"get", "harbour.jpg", "title"}, "\"title\": did you mean dc:title?"},
+      {{"get", "harbour.jpg", "DC:Title[@fr]"}, "\"DC:Title[@fr]\": did you mean dc:title[@fr]?"},
+      {{"set", "harbour.jpg", "--delete", "dc:Rating"}, "\"dc:Rating\": did you mean xmp:Rating?"},
+      {{"set", "harbour.jpg", "-XMP-dc:Title=x"}, "\"-XMP-dc:Title=x\" is ExifTool's form; ovrameta writes dc:title=x"},
+      {{"set", "harbour.jpg", "Rating=3"}, "\"Rating=3\" is ExifTool's form; ovrameta writes xmp:Rating=3"},
+      {{"get", "-Keywords", "harbour.jpg"}, "\"-Keywords\" is ExifTool's form; ovrameta reads dc:subject, "},
+      {{"set", "harbour.jpg", "nothing=3"}, "\"nothing\" is not a property name"}};
+  for (const auto& [arguments, message] : cases) {
+    const Result result = Run(arguments);
+    EXPECT_EQ(result.status, 2) << message;
+    ExpectContains(result.err, {"ovrameta: " + message});
+  }
+  EXPECT_EQ(Get(mDir / "harbour.jpg", "dc:title"), "Harbour at dawn");
+}
+
 TEST_F(OvrametaTest, VersionUsageAndMessagesNameTheToolNotThePathItRanBy) {
   const Result version = Run({"--version"});
   EXPECT_EQ(version.status, 0);
   EXPECT_EQ(version.out, "ovrameta " OVRAMETA_VERSION "\n");
-  ExpectContains(Run({"show", "--help"}).out, {"\nUsage: ovrameta show [OPTIONS] FILE...\n"});
+  ExpectContains(Run({"show", "--help"}).out, {"\nUsage: ovrameta show [OPTIONS] [FILE...]\n"});
   const Result missing = Run({"show"});
   EXPECT_EQ(missing.status, 2);
   EXPECT_EQ(missing.err, "ovrameta: FILE is required\nRun 'ovrameta --help' for more information.\n");
@@ -449,6 +495,11 @@ TEST_F(OvrametaTest, ProgressBarRunsOnATerminalOnly) {
   const std::string terminal =
       RunCommand("cd " + Quote(mDir.path().string()) + " && script -qec " + Quote(Command(arguments)) + " /dev/null");
   ExpectContains(terminal, {"25/25 files read", "f9.jpg: dc:title = Harbour at dawn"});
+  // The bar follows standard error alone.
+  const std::string in = "cd " + Quote(mDir.path().string()) + " && script -qec ";
+  ExpectContains(RunCommand(in + Quote(Command(arguments) + " >out.txt") + " /dev/null"), {"25/25 files read"});
+  EXPECT_EQ(RunCommand(in + Quote(Command(arguments) + " 2>err.txt") + " /dev/null").find("files read"),
+            std::string::npos);
 }
 
 TEST_F(OvrametaTest, OvrametaReadsWhatExifToolWrote) {

@@ -22,6 +22,7 @@
 
 #include <ovrametadata/ovrametadata.h>
 
+#include "Files.h"
 #include "Lists.h"
 #include "Names.h"
 #include "Parallel.h"
@@ -269,6 +270,15 @@ bool IsExistingPath(const std::string& argument) {
   return std::filesystem::exists(argument, error);
 }
 
+// The files of a command, with folders and lists (see ExpandFiles); what
+// cannot be taken is reported.
+std::vector<std::string> FilesOf(const std::vector<std::string>& given, Reporter& reporter) {
+  std::vector<std::string> problems;
+  std::vector<std::string> files = ExpandFiles(given, problems);
+  for (const auto& problem : problems) reporter.Error("", problem, kExitUsage);
+  return files;
+}
+
 // ---------------------------------------------------------------------------
 // Printing
 
@@ -420,6 +430,12 @@ void PrintTable(const std::vector<std::vector<Cell>>& rows, const std::vector<st
   }
 }
 
+// The status of a command whose file list was checked apart (see FilesOf).
+int StatusWith(Reporter& reporter, Reporter& listing) {
+  reporter.Relay(listing);
+  return reporter.status();
+}
+
 // ---------------------------------------------------------------------------
 // Arguments
 
@@ -435,7 +451,12 @@ void SplitArguments(const std::vector<std::string>& arguments, std::vector<std::
     const auto equals = argument.find('=');
     std::string head = equals == std::string::npos ? argument : argument.substr(0, equals);
     if (equals != std::string::npos && !head.empty() && (head.back() == '+' || head.back() == '-')) head.pop_back();
-    if (LooksLikeName(head) && !IsExistingPath(argument)) {
+    // Also names gone wrong, to be answered with the registered one:
+    // "title=x", and "title" when a property has that name.
+    const bool plain = head.find_first_of("/.") == std::string::npos;
+    const bool name =
+        LooksLikeName(head) || (plain && (equals != std::string::npos || !SuggestName(head).empty()));
+    if (name && !IsExistingPath(argument)) {
       names.push_back(argument);
     } else {
       files.push_back(argument);
@@ -474,9 +495,14 @@ Session::~Session() {
 // ---------------------------------------------------------------------------
 // show
 
-int ShowCommand(const std::vector<std::string>& files, bool each, const std::string& viewName,
+int ShowCommand(const std::vector<std::string>& given, bool each, const std::string& viewName,
                 const std::string& fieldList) {
   Reporter reporter;
+  const std::vector<std::string> files = FilesOf(given, reporter);
+  if (files.empty()) {
+    if (reporter.status() == kExitSuccess) reporter.Error("", "show: no file found", kExitUsage);
+    return reporter.status();
+  }
   std::vector<Path> fieldPaths;
   if (!fieldList.empty() && !ReadFieldList(fieldList, fieldPaths)) return kExitUsage;
   const std::vector<Path>* fields = fieldList.empty() ? nullptr : &fieldPaths;
@@ -551,9 +577,13 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
   std::vector<std::string> files;
   std::vector<std::string> nameTexts;
   SplitArguments(arguments, files, nameTexts);
+  // Files that cannot be taken count in the exit status, not in the checks
+  // of what is asked: the other files are worked on.
+  Reporter listing;
+  files = FilesOf(files, listing);
   if (files.empty()) {
-    reporter.Error("", "get: no file given", kExitUsage);
-    return reporter.status();
+    if (listing.status() == kExitSuccess) listing.Error("", "get: no file given", kExitUsage);
+    return listing.status();
   }
   if (nameTexts.empty() && !options.json && !options.csv) {
     reporter.Error("", "get: no property name given (prefix:Property), or use --json or --csv", kExitUsage);
@@ -567,7 +597,7 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
       reporter.Error("", Quoted(text) + ": get takes names, not assignments", kExitUsage);
     } else if (ResolveName(text, name, error)) {
       names.push_back(name);
-    } else if (!SchemaForPrefix(text.substr(0, text.find(':')))) {
+    } else if (!SchemaForPrefix(text.substr(0, text.find(':'))) && SuggestName(text).empty()) {
       // No definition: looked up by the prefix each file declares.
       name.name = name.label = text;
       names.push_back(name);
@@ -686,6 +716,7 @@ int GetCommand(const std::vector<std::string>& arguments, const GetOptions& opti
   progress.Clear();
   if (options.json) std::cout << output.dump(2) << '\n';
   if (options.csv) PrintTable(table, nameTexts);
+  reporter.Relay(listing);
   return reporter.status();
 }
 
@@ -1028,14 +1059,18 @@ int SetCommand(const std::vector<std::string>& arguments, const EditOptions& opt
   std::vector<std::string> files;
   std::vector<std::string> assignmentTexts;
   SplitArguments(arguments, files, assignmentTexts);
+  // Files that cannot be taken count in the exit status, not in the checks
+  // of what is asked: the other files are worked on.
+  Reporter listing;
+  files = FilesOf(files, listing);
   if (files.empty()) {
-    reporter.Error("", "set: no file given", kExitUsage);
-    return reporter.status();
+    if (listing.status() == kExitSuccess) listing.Error("", "set: no file given", kExitUsage);
+    return listing.status();
   }
   if (assignmentTexts.empty() && options.deletes.empty()) {
     reporter.Error("", "set: nothing to do (give NAME=VALUE, NAME+=ITEM, NAME-=ITEM or --delete NAME)",
                    kExitUsage);
-    return reporter.status();
+    return StatusWith(reporter, listing);
   }
 
   // Everything is checked before anything is written.
@@ -1063,7 +1098,7 @@ int SetCommand(const std::vector<std::string>& arguments, const EditOptions& opt
   }
   if (reporter.status() != kExitSuccess) {
     std::cerr << "ovrameta: nothing was written" << std::endl;
-    return reporter.status();
+    return StatusWith(reporter, listing);
   }
 
   // A file that cannot be read is named and left out; the others are
@@ -1071,7 +1106,7 @@ int SetCommand(const std::vector<std::string>& arguments, const EditOptions& opt
   std::vector<OpenedFile> opened = OpenForEdit(files, reporter);
   if (opened.empty()) {
     std::cerr << "ovrameta: nothing was written" << std::endl;
-    return reporter.status();
+    return StatusWith(reporter, listing);
   }
   std::vector<std::map<std::string, std::string>> before;
   if (options.dryRun)
@@ -1097,7 +1132,7 @@ int SetCommand(const std::vector<std::string>& arguments, const EditOptions& opt
       for (const auto& file : opened)
         if (file.created) std::filesystem::remove(file.name);
       std::cerr << "ovrameta: nothing was written" << std::endl;
-      return reporter.status();
+      return StatusWith(reporter, listing);
     }
     for (const Path& path : changes) update.AddChange(path);
   }
@@ -1112,7 +1147,7 @@ int SetCommand(const std::vector<std::string>& arguments, const EditOptions& opt
 
   std::size_t failed = files.size() - opened.size(), unchanged = 0;
   WriteEdited(opened, options, reporter, failed, unchanged, before, edits);
-  if (options.dryRun) return reporter.status();
+  if (options.dryRun) return StatusWith(reporter, listing);
   if (failed < files.size()) {
     std::vector<std::pair<std::string, std::string>> recent;
     for (const auto& edit : edits)
@@ -1120,7 +1155,7 @@ int SetCommand(const std::vector<std::string>& arguments, const EditOptions& opt
     RecordRecentValues(recent);
   }
   PrintCount(files.size(), failed, unchanged);
-  return reporter.status();
+  return StatusWith(reporter, listing);
 }
 
 // ---------------------------------------------------------------------------

@@ -1,6 +1,9 @@
 #include "Names.h"
 
+#include <algorithm>
+#include <cctype>
 #include <cstdlib>
+#include <map>
 #include <set>
 
 #include "TextUtil.h"
@@ -78,6 +81,65 @@ std::vector<std::string> Split(const std::string& text, char separator) {
 
 std::string Quoted(const std::string& text) { return "\"" + text + "\""; }
 
+std::string Lowered(std::string text) {
+  std::transform(text.begin(), text.end(), text.begin(),
+                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+  return text;
+}
+
+// "a", "a or b", "a, b or c".
+std::string Alternatives(const std::vector<std::string>& names) {
+  std::string text;
+  for (std::size_t i = 0; i < names.size(); ++i)
+    text += (i == 0 ? "" : i + 1 == names.size() ? " or " : ", ") + names[i];
+  return text;
+}
+
+// ExifTool's names for values whose registered names differ from them.
+const std::map<std::string, std::string> kExifToolTags = {
+    {"keywords", "dc:subject"},       {"caption-abstract", "dc:description"},
+    {"imagedescription", "dc:description"}, {"by-line", "dc:creator"},
+    {"artist", "dc:creator"},         {"copyright", "dc:rights"},
+    {"copyrightnotice", "dc:rights"}, {"objectname", "dc:title"},
+};
+const std::map<std::string, std::string> kExifToolGroups = {
+    {"iptccore", "Iptc4xmpCore"}, {"iptcext", "Iptc4xmpExt"}};
+
+// A tag argument of ExifTool taken apart: -GROUP:TAG+=VALUE.
+struct TagArgument {
+  bool dash = false;
+  std::string group;
+  std::string tag;
+  char operation = 0;  // '+', '-' or '<' before the '='
+  bool assigns = false;
+  std::string value;
+};
+
+bool IsTagName(const std::string& text) {
+  if (text.empty() || !std::isalpha(static_cast<unsigned char>(text[0]))) return false;
+  return std::all_of(text.begin(), text.end(),
+                     [](unsigned char c) { return std::isalnum(c) || c == '_' || c == '-'; });
+}
+
+bool ParseTagArgument(const std::string& argument, TagArgument& out) {
+  out.dash = argument.size() > 1 && argument[0] == '-' && argument[1] != '-';
+  const std::string body = out.dash ? argument.substr(1) : argument;
+  const auto equals = body.find('=');
+  std::string head = body.substr(0, equals);
+  out.assigns = equals != std::string::npos;
+  if (out.assigns) {
+    out.value = body.substr(equals + 1);
+    if (!head.empty() && (head.back() == '+' || head.back() == '-' || head.back() == '<')) {
+      out.operation = head.back();
+      head.pop_back();
+    }
+  }
+  const auto colon = head.find(':');
+  out.group = colon == std::string::npos ? std::string() : head.substr(0, colon);
+  out.tag = colon == std::string::npos ? head : head.substr(colon + 1);
+  return IsTagName(out.tag) && (colon == std::string::npos || IsTagName(out.group));
+}
+
 }  // namespace
 
 std::vector<SchemaDefinitionPtr> KnownSchemas() {
@@ -154,28 +216,98 @@ Path FieldPath(const Path& path, const EntryDefinition& entry,
   }
 }
 
+std::vector<std::string> SuggestName(const std::string& name) {
+  const auto end = name.find_first_of("/[");
+  const std::string head = name.substr(0, end);
+  const std::string tail = end == std::string::npos ? std::string() : name.substr(end);
+  const auto colon = head.find(':');
+  const std::string prefix = colon == std::string::npos ? std::string() : Lowered(head.substr(0, colon));
+  const std::string local = Lowered(colon == std::string::npos ? head : head.substr(colon + 1));
+  if (local.empty()) return {};
+  std::vector<std::string> found;
+  const auto add = [&](const std::string& candidate) {
+    if (found.size() < 3 && candidate + tail != name &&
+        std::find(found.begin(), found.end(), candidate + tail) == found.end())
+      found.push_back(candidate + tail);
+  };
+  const auto schemas = KnownSchemas();
+  // Internal properties (an edit list's title) only when their schema is named.
+  const auto matching = [&](const SchemaDefinitionPtr& schema, bool internal) {
+    for (const auto& property : schema->properties) {
+      if (property && (internal || !property->isInternal) && Lowered(property->name) == local)
+        add(schema->prefix + ":" + property->name);
+    }
+  };
+  if (!prefix.empty()) {
+    const auto schema = std::find_if(schemas.begin(), schemas.end(),
+                                     [&](const SchemaDefinitionPtr& s) { return Lowered(s->prefix) == prefix; });
+    // Any prefix may be a namespace without a definition.
+    if (schema == schemas.end()) return {};
+    matching(*schema, true);
+    if (!found.empty()) return found;
+  } else {
+    const auto tag = kExifToolTags.find(local);
+    if (tag != kExifToolTags.end()) add(tag->second);
+  }
+  for (const auto& schema : schemas) matching(schema, false);
+  return found;
+}
+
+bool IsExifToolForm(const std::string& argument) {
+  TagArgument parsed;
+  if (!ParseTagArgument(argument, parsed)) return false;
+  const bool xmpGroup = Lowered(parsed.group.substr(0, 4)) == "xmp-";
+  // -j4 and -r are the tool's options; ExifTool's tags start upper case.
+  if (parsed.dash)
+    return parsed.tag.size() > 1 &&
+           (parsed.assigns || !parsed.group.empty() || std::isupper(static_cast<unsigned char>(parsed.tag[0])));
+  return xmpGroup || (parsed.assigns && parsed.group.empty());
+}
+
+std::string ExifToolAnswer(const std::string& argument) {
+  TagArgument parsed;
+  if (!IsExifToolForm(argument) || !ParseTagArgument(argument, parsed)) return std::string();
+  std::string prefix = parsed.group;
+  if (Lowered(prefix.substr(0, 4)) == "xmp-") prefix = prefix.substr(4);
+  const auto group = kExifToolGroups.find(Lowered(prefix));
+  if (group != kExifToolGroups.end()) prefix = group->second;
+  std::vector<std::string> names = prefix.empty() ? std::vector<std::string>() : SuggestName(prefix + ":" + parsed.tag);
+  // ExifTool's groups (EXIF, IPTC) are not prefixes; the tag may still be known.
+  if (names.empty()) names = SuggestName(parsed.tag);
+  if (names.empty() && !parsed.dash) return std::string();
+  std::string answer = Quoted(argument) + " is ExifTool's form; ovrameta ";
+  if (names.empty()) return answer + "names properties prefix:Property (ovrameta schemas lists them)";
+  if (!parsed.assigns) return answer + "reads " + Alternatives(names);
+  if (parsed.operation) return answer + "names it " + Alternatives(names);
+  if (parsed.value.empty()) return answer + "deletes with --delete " + Alternatives(names);
+  for (auto& name : names) name += "=" + parsed.value;
+  return answer + "writes " + Alternatives(names);
+}
+
 bool ResolveName(const std::string& fullName, ResolvedName& out, std::string& error) {
   std::string language;
   const std::string name = WithoutLanguage(fullName, &language);
   const auto segments = Split(name, '/');
   Segment first;
-  if (!ParseSegment(segments.front(), first)) {
-    error = Quoted(name) + " is not a property name (expected prefix:Property)";
+  // A name almost right ("title", "DC:Title") gets the registered one
+  // rather than the reason.
+  const auto unknown = [&](const std::string& reason) {
+    const auto names = SuggestName(fullName);
+    error = names.empty() ? reason : Quoted(fullName) + ": did you mean " + Alternatives(names) + "?";
     return false;
-  }
+  };
+  if (!ParseSegment(segments.front(), first))
+    return unknown(Quoted(name) + " is not a property name (expected prefix:Property)");
   const auto schema = SchemaForPrefix(first.prefix);
   if (!schema) {
-    error = Quoted(name) + ": no schema is registered with the prefix " + Quoted(first.prefix) +
-            " (values without a definition can be read but not written; the README says how to add one)";
-    return false;
+    return unknown(Quoted(name) + ": no schema is registered with the prefix " + Quoted(first.prefix) +
+                   " (values without a definition can be read but not written; the README says how to add one)");
   }
   const std::string schemaLabel = LabelOr(schema->label, schema->prefix);
   Path path = PathForSchemaNameAndPropertyName(schema->namespaceURI, first.local);
-  if (path.description.empty()) {
-    error = Quoted(name) + ": " + schemaLabel + " (" + schema->prefix +
-            ") has no property " + Quoted(first.local);
-    return false;
-  }
+  if (path.description.empty())
+    return unknown(Quoted(name) + ": " + schemaLabel + " (" + schema->prefix + ") has no property " +
+                   Quoted(first.local));
   auto entry = PathEntryDefinition(path);
   std::string walked = first.prefix + ":" + first.local;
   auto takeItem = [&](int index) -> bool {

@@ -27,6 +27,24 @@ std::string WithoutLanguage(const std::string& name, std::string* language);
 // a colon and a local name. Says nothing about whether it is registered.
 bool LooksLikeName(const std::string& text);
 
+// The registered names a name that does not resolve was probably meant
+// as, at most three: the property of another case ("dc:Title", "DC:title"),
+// or of that local name in any schema ("title", ExifTool's "Keywords").
+// Empty when none is close, and for a prefix no schema has in any case
+// (files may hold namespaces without a definition). What follows the first
+// step ("/...", "[...]") is kept.
+std::vector<std::string> SuggestName(const std::string& name);
+
+// Whether argument has the shape of ExifTool's tag arguments: -Title=x,
+// -XMP-dc:Title=x, -Rating, Rating=3, XMP-dc:Title. prefix:Property=VALUE
+// and the tool's own options are not.
+bool IsExifToolForm(const std::string& argument);
+
+// The answer to an argument in ExifTool's form: ovrameta's way of saying
+// it. Empty for a form without the dash ("Rating=3") when no property is
+// close, as it may be meant otherwise.
+std::string ExifToolAnswer(const std::string& argument);
+
 struct ResolvedName {
   std::string name;  // as written by the user
   ovrametadata::Path path;
@@ -38,7 +56,8 @@ struct ResolvedName {
 // Resolves "prefix:Property", "prefix:Struct/prefix:Field" (any depth) and
 // items "prefix:Array[2]" (1-based), and one language of an alternative
 // "prefix:Alt[@fr]". On failure returns false and sets
-// error to a sentence naming the property.
+// error to a sentence naming the property, or the names it was probably
+// meant as (see SuggestName).
 bool ResolveName(const std::string& name, ResolvedName& out, std::string& error);
 
 // The allowed values of a choice entry: its own, else those of its type.

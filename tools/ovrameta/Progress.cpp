@@ -21,7 +21,9 @@ int TerminalWidth() {
 Progress::Progress(std::size_t total, std::string what)
     : mTotal(total),
       mWhat(std::move(what)),
-      mEnabled(total >= kMinimumFiles && isatty(STDOUT_FILENO) && isatty(STDERR_FILENO)) {}
+      // The bar is drawn on standard error: results sent to a file or a
+      // pipe leave it on the terminal.
+      mEnabled(total >= kMinimumFiles && isatty(STDERR_FILENO)) {}
 
 Progress::~Progress() { Clear(); }
 

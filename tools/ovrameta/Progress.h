@@ -9,8 +9,8 @@ namespace ovrameta {
 
 class Progress {
  public:
-  // Draws nothing unless standard output and standard error are both
-  // terminals and there are at least kMinimumFiles steps.
+  // Draws nothing unless standard error is a terminal and there are at
+  // least kMinimumFiles steps.
   Progress(std::size_t total, std::string what);
   ~Progress();
   Progress(const Progress&) = delete;

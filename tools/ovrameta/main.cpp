@@ -1,6 +1,7 @@
 // ovrameta: shows and edits the XMP metadata of media files through
 // ovrametadata, the way a host application does.
 #include <csignal>
+#include <filesystem>
 #include <iostream>
 #include <string>
 #include <vector>
@@ -9,7 +10,9 @@
 #include <ovrametadata/MetadataUtils.h>
 
 #include "Commands.h"
+#include "Files.h"
 #include "Lists.h"
+#include "Names.h"
 #include "Parallel.h"
 #include "ViewShow.h"
 
@@ -54,11 +57,29 @@ int main(int argc, char** argv) {
       "Exit status: 0 success, 1 a named value is absent, 2 usage error or a file that cannot\n"
       "be read or written.");
 
+  // Every command that takes files walks folders and reads lists alike.
+  ovrameta::FileOptions fileOptions;
+  const auto takesFiles = [&](CLI::App* command) {
+    auto* recursive =
+        command->add_flag("-r,--recursive", fileOptions.recursive, "Take the files below the folders given");
+    command->add_option("--ext", fileOptions.extensions, "Only these endings from folders: jpg,mp4")
+        ->type_name("EXT,...")
+        ->allow_extra_args(false)
+        ->delimiter(',')
+        ->needs(recursive);
+    command->add_option("-@,--files-from", fileOptions.lists,
+                        "Also the files named in FILE, one a line (- for standard input)")
+        ->type_name("FILE")
+        ->allow_extra_args(false);
+  };
+
   std::vector<std::string> showFiles;
   bool each = false;
   auto* show = app.add_subcommand(
       "show", "Show every value: of one file, or of several files as one aggregate");
-  show->add_option("FILE", showFiles, "Media files")->required();
+  // Required unless a list names them (checked after parsing).
+  show->add_option("FILE", showFiles, "Media files or, with -r, folders");
+  takesFiles(show);
   show->add_flag("--each", each, "Show several files one by one instead of as an aggregate");
   std::string viewName;
   show->add_option("--view", viewName, "Show the values as this view lays them out (see views)");
@@ -69,6 +90,7 @@ int main(int argc, char** argv) {
   ovrameta::GetOptions getOptions;
   auto* get = app.add_subcommand("get", "Show the display value of named properties");
   get->add_option("ARGS", getArguments, "FILE... NAME...")->required();
+  takesFiles(get);
   get->add_flag("--raw", getOptions.raw, "The stored text instead of the display value");
   get->add_flag("--json", getOptions.json,
                 "Machine-readable output with types (all properties when no NAME is given)");
@@ -80,6 +102,7 @@ int main(int argc, char** argv) {
   std::string importJson, importCsv;
   auto* set = app.add_subcommand("set", "Write values, checked against the definitions");
   set->add_option("ARGS", setArguments, "FILE... NAME=VALUE... (NAME+=ITEM, NAME-=ITEM for lists)");
+  takesFiles(set);
   set->add_option("--delete", editOptions.deletes, "Delete the value of NAME")->expected(1, -1);
   set->add_option("--json", importJson, "Apply the values of a JSON file (as get --json writes) to the files it names");
   set->add_option("--csv", importCsv, "Apply the rows of a CSV file (as get --csv writes) to the files they name");
@@ -120,11 +143,33 @@ int main(int argc, char** argv) {
   auto* fields = app.add_subcommand("fields", "Write a path list of the fields below properties (for show --fields)");
   fields->add_option("NAME", fieldNames, "Properties")->required();
 
+  // ExifTool's tag arguments (-Title=x) would read as unknown options: they
+  // are taken out and answered once the schemas are loaded.
+  std::vector<std::string> exifToolForms;
+  std::vector<char*> arguments;
+  for (int i = 0; i < argc; ++i) {
+    // What follows "--" is taken as it is.
+    if (std::string(argv[i]) == "--") {
+      arguments.insert(arguments.end(), argv + i, argv + argc);
+      break;
+    }
+    std::error_code error;
+    if (i > 0 && argv[i][0] == '-' && ovrameta::IsExifToolForm(argv[i]) &&
+        !std::filesystem::exists(argv[i], error)) {
+      exifToolForms.push_back(argv[i]);
+    } else {
+      arguments.push_back(argv[i]);
+    }
+  }
   try {
-    app.parse(argc, argv);
+    app.parse(static_cast<int>(arguments.size()), arguments.data());
+    if (*show && showFiles.empty() && fileOptions.lists.empty()) throw CLI::RequiredError("FILE");
   } catch (const CLI::ParseError& error) {
-    const int status = app.exit(error);
-    return status == 0 ? 0 : ovrameta::kExitUsage;
+    // Answering ExifTool's forms says more than the usage error they cause.
+    if (exifToolForms.empty() || error.get_exit_code() == 0) {
+      const int status = app.exit(error);
+      return status == 0 ? 0 : ovrameta::kExitUsage;
+    }
   }
 
   if (jobs != 0) ovrameta::SetJobs(jobs);
@@ -133,10 +178,22 @@ int main(int argc, char** argv) {
     editOptions.importFile = importJson.empty() ? importCsv : importJson;
     editOptions.importCSV = importJson.empty();
   }
+  ovrameta::SetFileOptions(fileOptions);
   ovrameta::Session session;
   if (!session.ok()) return ovrameta::kExitUsage;
   // Packages may bring schemas, so every command loads them.
   const auto problems = ovrameta::LoadViews(static_cast<bool>(*packages));
+  // Without the dash (Rating=3) the form is answered only when a property
+  // is close: the argument may be meant otherwise.
+  for (const std::string& argument : *get ? getArguments : setArguments) {
+    std::error_code error;
+    if ((*get || *set) && ovrameta::IsExifToolForm(argument) && !std::filesystem::exists(argument, error) &&
+        !ovrameta::ExifToolAnswer(argument).empty())
+      exifToolForms.push_back(argument);
+  }
+  for (const std::string& argument : exifToolForms)
+    std::cerr << "ovrameta: " << ovrameta::ExifToolAnswer(argument) << '\n';
+  if (!exifToolForms.empty()) return ovrameta::kExitUsage;
   if (*packages) return ovrameta::PackagesCommand(problems);
   if (*show) return ovrameta::ShowCommand(showFiles, each, viewName, fieldList);
   if (*recent) return ovrameta::RecentCommand(recentName, recentClear);
