@@ -885,6 +885,16 @@ std::map<std::string, std::string> ReadNamed(const OpenedFile& file, const std::
   return values;
 }
 
+// What an edit goes through: the one file, or an aggregate of all of them,
+// so that values that differ stay as each file has them.
+boost::shared_ptr<MetaDataProvider> EditTarget(const std::vector<OpenedFile>& opened) {
+  if (opened.size() == 1) return opened.front().provider;
+  auto aggregate = boost::make_shared<AggregateProvider>();
+  for (const auto& file : opened) aggregate->AddProvider(file.provider, false);
+  aggregate->OnProxyMetaDataChange(nullptr);
+  return aggregate;
+}
+
 // Opens the files to edit; those that cannot be read are named and left
 // out. Files without XMP start from an empty packet.
 std::vector<OpenedFile> OpenForEdit(const std::vector<std::string>& files, Reporter& reporter) {
@@ -1116,13 +1126,7 @@ int SetCommand(const std::vector<std::string>& arguments, const EditOptions& opt
   for (const auto& file : opened) names.push_back(file.name);
   const std::string context = FileList(names);
   {
-    boost::shared_ptr<MetaDataProvider> target = opened.front().provider;
-    if (opened.size() > 1) {
-      auto aggregate = boost::make_shared<AggregateProvider>();
-      for (const auto& file : opened) aggregate->AddProvider(file.provider, false);
-      aggregate->OnProxyMetaDataChange(nullptr);
-      target = aggregate;
-    }
+    const boost::shared_ptr<MetaDataProvider> target = EditTarget(opened);
     // Every value must go in before any file is written: a change is only
     // recorded (and so written) when all of them did.
     MetaDataUpdateAccess update(target);
@@ -1210,13 +1214,7 @@ int CopyCommand(const std::vector<std::string>& arguments, const EditOptions& op
   std::vector<std::string> names;
   for (const auto& file : opened) names.push_back(file.name);
   {
-    boost::shared_ptr<MetaDataProvider> target = opened.front().provider;
-    if (opened.size() > 1) {
-      auto aggregate = boost::make_shared<AggregateProvider>();
-      for (const auto& file : opened) aggregate->AddProvider(file.provider, false);
-      aggregate->OnProxyMetaDataChange(nullptr);
-      target = aggregate;
-    }
+    const boost::shared_ptr<MetaDataProvider> target = EditTarget(opened);
     MetaDataReadAccess reader(source.provider);
     MetaDataUpdateAccess update(target);
     const std::size_t reports = GetErrorInfos().size();
