@@ -49,11 +49,16 @@ class PanelTest : public ::testing::Test {
     static int argc = 1;
     static char name[] = "panel_tests";
     static char* argv[] = {name, nullptr};
-    static QApplication app(argc, argv);
+    // Ended before the process exits: Qt's own globals go at exit.
+    sApp = new QApplication(argc, argv);
     Initialize();
     LoadAllViewDefinitions();
   }
-  static void TearDownTestSuite() { Terminate(); }
+  static void TearDownTestSuite() {
+    Terminate();
+    delete sApp;
+  }
+  static inline QApplication* sApp = nullptr;
 
   fs::path Copy(const std::string& sample, const std::string& as) {
     const fs::path target = mDir / as;
