@@ -11,6 +11,7 @@
 #include <QCompleter>
 #include <QDateTimeEdit>
 #include <QDoubleSpinBox>
+#include <QFocusEvent>
 #include <QGroupBox>
 #include <QImage>
 #include <QLineEdit>
@@ -284,6 +285,19 @@ TEST_F(PanelTest, DatesKeepTheirZoneOrItsAbsence) {
   }
   EXPECT_EQ(Read(plain, kPhotoshop, "DateCreated", true), "2024-05-19T06:42:10");
   EXPECT_EQ(Read(zoned, kPhotoshop, "DateCreated", true), "2024-05-19T06:42:10+02:00");
+
+  // An empty date starts from today when entered, and stays empty when left.
+  const fs::path wav = Copy("ambience.wav", "c.wav");
+  const std::string bytes = ovratest::ReadFile(wav);
+  window.OpenPaths({Q(wav)});
+  auto* edit = Part<QDateTimeEdit>(One(window, "photoshop:DateCreated"));
+  QFocusEvent in(QEvent::FocusIn), out(QEvent::FocusOut);
+  QApplication::sendEvent(edit, &in);
+  EXPECT_EQ(edit->date(), QDate::currentDate());
+  QApplication::sendEvent(edit, &out);
+  EXPECT_FALSE(One(window, "photoshop:DateCreated")->Edited());
+  EXPECT_TRUE(window.Save());
+  EXPECT_EQ(ovratest::ReadFile(wav), bytes);
 }
 
 TEST_F(PanelTest, ReportsGoToTheMessagePane) {

@@ -10,6 +10,7 @@
 #include <QCompleter>
 #include <QDateTimeEdit>
 #include <QDoubleSpinBox>
+#include <QEvent>
 #include <QHBoxLayout>
 #include <QLabel>
 #include <QLineEdit>
@@ -570,7 +571,24 @@ class DateField : public Field {
     mZoneLabel->setText(mZone.isEmpty() ? (mParts > 3 && mHasValue ? QStringLiteral("no zone") : QString())
                                         : mZone == "Z" ? QStringLiteral("UTC") : "UTC" + mZone);
     connect(mEdit, &QDateTimeEdit::dateTimeChanged, this, &DateField::MarkEdited);
+    mEdit->installEventFilter(this);
     mWidget = box;
+  }
+
+  // An empty editor starts from now rather than from its "no value" date;
+  // left unchanged, it is empty again and nothing is written.
+  bool eventFilter(QObject* watched, QEvent* event) override {
+    const QDateTime none = mEdit->minimumDateTime();
+    if (event->type() == QEvent::FocusIn && !mEdited && mEdit->dateTime() == none) {
+      const QSignalBlocker block(mEdit);
+      mEdit->setDateTime(QDateTime(QDate::currentDate(), QTime::currentTime().addMSecs(-QTime::currentTime().msec())));
+      mStarted = true;
+    } else if (event->type() == QEvent::FocusOut && mStarted && !mEdited) {
+      const QSignalBlocker block(mEdit);
+      mEdit->setDateTime(none);
+      mStarted = false;
+    }
+    return Field::eventFilter(watched, event);
   }
 
   QString Text() const {
@@ -587,6 +605,7 @@ class DateField : public Field {
  private:
   QDateTimeEdit* mEdit = nullptr;
   QLabel* mZoneLabel = nullptr;
+  bool mStarted = false;  // showing now, in place of no value
   int mParts = 5;  // year, month, day, minutes, seconds: how much was stored
   QString mZone;
 };
@@ -697,6 +716,9 @@ class ListField : public Field {
     mList = new QListWidget;
     mList->setSelectionMode(QAbstractItemView::ExtendedSelection);
     mList->setMaximumHeight(mList->fontMetrics().lineSpacing() * 5 + 12);
+    // The items of a sequence are in an order that means something.
+    const auto primitive = PrimitiveTypeOfPath(path);
+    if (primitive && *primitive == kPrimitiveType_seq) mList->setDragDropMode(QAbstractItemView::InternalMove);
     if (mMixed) {
       auto* placeholder = new QListWidgetItem(kMixed, mList);
       placeholder->setFlags(Qt::NoItemFlags);
@@ -733,6 +755,7 @@ class ListField : public Field {
       MarkEdited();
     });
     connect(mList, &QListWidget::itemChanged, this, &ListField::MarkEdited);
+    connect(mList->model(), &QAbstractItemModel::rowsMoved, this, &ListField::MarkEdited);
     mWidget = box;
   }
 
