@@ -164,7 +164,7 @@ TEST_F(PanelTest, WidgetsFollowTheDefinitions) {
   EXPECT_EQ(kind("photoshop:DateCreated"), FieldKind::kDate);
   EXPECT_EQ(kind("exif:ExposureTime"), FieldKind::kReadOnly);
   EXPECT_EQ(Part<QLineEdit>(One(window, "exif:ExposureTime"))->text(), "1/250 sec");
-  EXPECT_EQ(kind("Iptc4xmpExt:LocationShown"), FieldKind::kReadOnly);  // items are structures
+  EXPECT_EQ(kind("Iptc4xmpExt:LocationShown"), FieldKind::kStructArray);  // items are structures
   Field* city = One(window, "Iptc4xmpCore:CreatorContactInfo/Iptc4xmpCore:CiAdrCity");
   ASSERT_NE(city, nullptr);
   EXPECT_EQ(Part<QLineEdit>(city)->text(), "San Francisco");
