@@ -933,7 +933,7 @@ class StructArrayField : public Field {
 
   void AddItem(XMPMetaRef xmp, int index) {
     // An added item is named after the index it would take now.
-    const int shown = index > 0 ? index : mRead + static_cast<int>(mItems.size()) + 1;
+    const int shown = index > 0 ? index : static_cast<int>(mItems.size()) + 1;
     const Path itemPath = ItemPath(mPath, shown);
     if (!mType || itemPath.description.empty()) return;
     auto item = std::make_unique<Item>();
