@@ -17,6 +17,7 @@
 #include <QLineEdit>
 #include <QListWidget>
 #include <QPlainTextEdit>
+#include <QPushButton>
 #include <QSpinBox>
 #include <QStringListModel>
 #include <QTabWidget>
@@ -164,7 +165,7 @@ TEST_F(PanelTest, WidgetsFollowTheDefinitions) {
   EXPECT_EQ(kind("photoshop:DateCreated"), FieldKind::kDate);
   EXPECT_EQ(kind("exif:ExposureTime"), FieldKind::kReadOnly);
   EXPECT_EQ(Part<QLineEdit>(One(window, "exif:ExposureTime"))->text(), "1/250 sec");
-  EXPECT_EQ(kind("Iptc4xmpExt:LocationShown"), FieldKind::kReadOnly);  // items are structures
+  EXPECT_EQ(kind("Iptc4xmpExt:LocationShown"), FieldKind::kStructArray);  // items are structures
   Field* city = One(window, "Iptc4xmpCore:CreatorContactInfo/Iptc4xmpCore:CiAdrCity");
   ASSERT_NE(city, nullptr);
   EXPECT_EQ(Part<QLineEdit>(city)->text(), "San Francisco");
@@ -247,6 +248,48 @@ TEST_F(PanelTest, ThreeFilesEditedAsOne) {
   QCompleter* completer = Part<QLineEdit>(One(next, "dc:title"))->completer();
   ASSERT_NE(completer, nullptr);
   EXPECT_TRUE(qobject_cast<QStringListModel*>(completer->model())->stringList().contains("New title"));
+}
+
+TEST_F(PanelTest, ItemsOfAnArrayOfStructures) {
+  if (!xmptest::media::HaveExifTool()) GTEST_SKIP() << "ExifTool is not installed";
+  const fs::path mp4 = Copy("interview.mp4", "a.mp4");
+  const auto before = ExifTool(mp4);
+  Window window;
+  window.OpenPaths({Q(mp4)});
+  Field* markers = One(window, "xmpDM:markers");
+  ASSERT_TRUE(markers && markers->Kind() == FieldKind::kStructArray);
+  const auto type = [&](const char* name, const char* text) {
+    auto* line = markers->Widget()->findChild<QLineEdit*>(name);
+    ASSERT_NE(line, nullptr) << name;
+    line->selectAll();
+    QTest::keyClicks(line, text);
+  };
+  type("xmpDM:markers[2]/xmpDM:name", "Boat");
+  for (auto* button : markers->Widget()->findChildren<QPushButton*>())
+    if (button->text() == "Add item") button->click();
+  type("xmpDM:markers[3]/xmpDM:name", "Wrap");
+  ASSERT_TRUE(window.Save()) << window.Messages().toStdString();
+
+  auto provider = boost::make_shared<FileProvider>(mp4.u16string());
+  MetaDataReadAccess reader(provider);
+  const Path array = PathForSchemaNameAndPropertyName("http://ns.adobe.com/xmp/1.0/DynamicMedia/", "markers");
+  ASSERT_EQ(CountArrayItems(*reader, array), 3);
+  const auto name = [&](int index) {
+    const Path item = CreatePathFromArrayItem(array, index);
+    UTF8String text;
+    GetValue(*reader, CreatePathFromArrayedStructureField(item, FieldNameDefinition(TypeEntryDefinition(item), "name")), text);
+    return text;
+  };
+  EXPECT_EQ(name(1), "Slate");
+  EXPECT_EQ(name(2), "Boat");
+  EXPECT_EQ(name(3), "Wrap");
+  const auto after = ExifTool(mp4);
+  EXPECT_EQ(after.at("XMP-xmpDM:Markers").size(), 3u);
+  EXPECT_EQ(after.at("XMP-xmpDM:Markers")[1].value("Comment", ""), "Boat enters");
+  const std::set<std::string> allowed = {"XMP-xmpDM:Markers", "XMP-xmpMM:History", "XMP-xmpMM:InstanceID",
+                                         "XMP-xmp:MetadataDate"};
+  for (const auto& tag : Changed(before, after))
+    EXPECT_TRUE(allowed.count(tag) || (tag.rfind("XMP-xmpMM:", 0) == 0 && !before.count(tag))) << tag;
 }
 
 TEST_F(PanelTest, RefusedValuesAreMarkedAndNeverWritten) {

@@ -3,6 +3,7 @@
 #include <charconv>
 #include <climits>
 #include <cmath>
+#include <algorithm>
 #include <set>
 
 #include <QCheckBox>
@@ -11,15 +12,19 @@
 #include <QDateTimeEdit>
 #include <QDoubleSpinBox>
 #include <QEvent>
+#include <QFormLayout>
+#include <QGroupBox>
 #include <QHBoxLayout>
 #include <QLabel>
 #include <QLineEdit>
 #include <QListWidget>
 #include <QPlainTextEdit>
+#include <QPushButton>
 #include <QRegularExpression>
 #include <QSignalBlocker>
 #include <QSpinBox>
 #include <QToolButton>
+#include <QVBoxLayout>
 
 namespace ovrapanel {
 
@@ -159,6 +164,7 @@ const char* FieldKindName(FieldKind kind) {
     case FieldKind::kDate: return "date";
     case FieldKind::kAltText: return "alt";
     case FieldKind::kList: return "list";
+    case FieldKind::kStructArray: return "structarray";
     case FieldKind::kReadOnly: return "readonly";
   }
   return "";
@@ -190,9 +196,11 @@ FieldKind KindOf(const Path& path, const EntryDefinition& entry, const FieldHint
   switch (*primitive) {
     case kPrimitiveType_bag:
     case kPrimitiveType_seq: {
-      // Items that are structures are shown, not edited.
+      // Items that are structures are edited as groups where the library
+      // adds and deletes items (top-level arrays), else only shown.
       const auto element = PropertyTypeOf(entry);
-      return element && !element->fields.empty() ? FieldKind::kReadOnly : FieldKind::kList;
+      if (!element || element->fields.empty()) return FieldKind::kList;
+      return path.parent_id == path.namespaceURI ? FieldKind::kStructArray : FieldKind::kReadOnly;
     }
     case kPrimitiveType_alt: return FieldKind::kAltText;
     case kPrimitiveType_closedchoice:
@@ -797,6 +805,176 @@ class ListField : public Field {
   QToolButton* mRemove = nullptr;
 };
 
+// The items of an array of structures, each a group of the editors a
+// structure's fields get. Edits stay in the form until written: edited
+// fields of kept items in place first, then added items at the end, then
+// removed items from the back, so that every index used is the one read.
+class StructArrayField : public Field {
+ public:
+  StructArrayField(XMPMetaRef xmp, const Path& path, const boost::shared_ptr<EntryDefinition>& entry)
+      : Field(path, entry, FieldKind::kStructArray, NameOfPath(path)), mType(PropertyTypeOf(*entry)) {
+    auto* box = new QWidget;
+    mLayout = new QVBoxLayout(box);
+    mLayout->setContentsMargins(0, 0, 0, 0);
+    mWidget = box;
+    GetValueResult result = ValueAbsent;
+    const Path probe = Probe(1);
+    if (!probe.description.empty()) ReadText(xmp, probe, result);
+    // Arrays that differ between files are not merged item by item.
+    mMixed = result == ValueMixed;
+    if (mMixed) {
+      auto* line = new QLineEdit;
+      line->setPlaceholderText(kMixed);
+      line->setReadOnly(true);
+      line->setFrame(false);
+      mLayout->addWidget(line);
+      return;
+    }
+    mRead = CountArrayItems(xmp, path);
+    mHasValue = mRead > 0;
+    for (int index = 1; index <= mRead; ++index) AddItem(xmp, index);
+    auto* add = new QPushButton(QStringLiteral("Add item"));
+    mLayout->addWidget(add, 0, Qt::AlignLeft);
+    connect(add, &QPushButton::clicked, this, [this] {
+      AddItem(nullptr, 0);
+      MarkEdited();
+    });
+  }
+
+  bool Write(XMPMetaRef xmp) override {
+    mChanged.clear();
+    bool changed = false;
+    for (const auto& item : mItems)
+      if (item->index > 0 && !item->removed) changed = WriteFields(xmp, *item, nullptr) || changed;
+    for (const auto& item : mItems) {
+      const bool edited = std::any_of(item->fields.begin(), item->fields.end(),
+                                      [](const auto& f) { return f.second->Edited(); });
+      // An added item left empty, or removed again, is not written.
+      if (item->index > 0 || item->removed || !edited) continue;
+      const int at = CountArrayItems(xmp, mPath);
+      if (!AddArrayItem(xmp, mPath, at)) continue;
+      const Path itemPath = CreatePathFromArrayItem(mPath, at + 1);
+      WriteFields(xmp, *item, &itemPath);
+      changed = true;
+    }
+    std::vector<int> removed;
+    for (const auto& item : mItems)
+      if (item->index > 0 && item->removed) removed.push_back(item->index);
+    std::sort(removed.rbegin(), removed.rend());
+    bool deleted = false;
+    for (int index : removed) deleted = DeleteArrayItem(xmp, mPath, index - 1) || deleted;
+    if (deleted) {
+      // An aggregate clears in its files what reads as empty here, and an
+      // array of structures does not read as text: name the array only once
+      // it is gone, else a field of its first item.
+      const Path probe = Probe(1);
+      mChanged.push_back(CountArrayItems(xmp, mPath) == 0 || probe.description.empty() ? mPath : probe);
+    }
+    return changed || deleted;
+  }
+  std::vector<Path> ChangedPaths() const override { return mChanged; }
+
+ protected:
+  QString Check() const override {
+    for (const auto& item : mItems)
+      for (const auto& field : item->fields)
+        if (!item->removed && !field.second->Problem().isEmpty()) return field.second->Problem();
+    return {};
+  }
+
+ private:
+  struct Item {
+    int index = 0;  // 1-based as read; 0 for an added item
+    bool removed = false;
+    QGroupBox* box = nullptr;
+    std::vector<std::pair<boost::shared_ptr<FieldDefinition>, std::unique_ptr<Field>>> fields;
+  };
+
+  static Path FieldPath(const Path& item, const boost::shared_ptr<FieldDefinition>& field) {
+    try {
+      return CreatePathFromArrayedStructureField(item, field);
+    } catch (const std::exception&) {
+      return {};  // a field the toolkit cannot address is left out
+    }
+  }
+  static Path ItemPath(const Path& array, int index) {
+    try {
+      return CreatePathFromArrayItem(array, index);
+    } catch (const std::exception&) {
+      return {};
+    }
+  }
+  // The first plain field of item index: it reads as text in any packet.
+  Path Probe(int index) const {
+    const Path item = ItemPath(mPath, index);
+    if (!mType || item.description.empty()) return {};
+    for (const auto& field : mType->fields) {
+      const Path path = FieldPath(item, field);
+      const auto primitive = path.description.empty() ? boost::none : PrimitiveTypeOfPath(path);
+      if (primitive && *primitive != kPrimitiveType_bag && *primitive != kPrimitiveType_seq &&
+          *primitive != kPrimitiveType_alt)
+        return path;
+    }
+    return {};
+  }
+
+  // Writes the edited fields of item, at itemPath when given (an added item).
+  bool WriteFields(XMPMetaRef xmp, Item& item, const Path* itemPath) {
+    bool changed = false;
+    for (auto& [definition, field] : item.fields) {
+      if (!field->Edited()) continue;
+      if (itemPath) field->SetPath(FieldPath(*itemPath, definition));
+      if (field->GetPath().description.empty() || !field->Write(xmp)) continue;
+      mChanged.push_back(field->GetPath());
+      changed = true;
+    }
+    return changed;
+  }
+
+  void AddItem(XMPMetaRef xmp, int index) {
+    // An added item is named after the index it would take now.
+    const int shown = index > 0 ? index : static_cast<int>(mItems.size()) + 1;
+    const Path itemPath = ItemPath(mPath, shown);
+    if (!mType || itemPath.description.empty()) return;
+    auto item = std::make_unique<Item>();
+    item->index = index;
+    item->box = new QGroupBox(index > 0 ? QStringLiteral("Item %1").arg(index) : QStringLiteral("New item"));
+    auto* form = new QFormLayout(item->box);
+    form->setFieldGrowthPolicy(QFormLayout::AllNonFixedFieldsGrow);
+    for (const auto& definition : mType->fields) {
+      const Path path = FieldPath(itemPath, definition);
+      if (path.description.empty() || !IsPropertyUISupported(path)) continue;
+      const auto entry = PathEntryDefinition(path);
+      if (!entry) continue;
+      const FieldHints hints;
+      auto field = MakeField(xmp, path, entry, KindOf(path, *entry, hints), hints, QStringList());
+      connect(field.get(), &Field::Changed, this, &StructArrayField::MarkEdited);
+      auto* name = new QLabel((definition->label.empty() ? Q(definition->name) : Q(definition->label)) + ':');
+      name->setToolTip(field->Name());
+      name->setBuddy(field->Widget());
+      form->addRow(name, field->Widget());
+      item->fields.emplace_back(definition, std::move(field));
+    }
+    auto* remove = new QPushButton(QStringLiteral("Remove item"));
+    form->addRow(remove);
+    Item* raw = item.get();
+    connect(remove, &QPushButton::clicked, this, [this, raw] {
+      raw->removed = true;
+      raw->box->hide();
+      MarkEdited();
+    });
+    // Items go above the "Add item" button.
+    mLayout->insertWidget(static_cast<int>(mItems.size()), item->box);
+    mItems.push_back(std::move(item));
+  }
+
+  TypeDefinitionPtr mType;
+  QVBoxLayout* mLayout = nullptr;
+  int mRead = 0;
+  std::vector<std::unique_ptr<Item>> mItems;
+  std::vector<Path> mChanged;
+};
+
 class ReadOnlyField : public Field {
  public:
   ReadOnlyField(XMPMetaRef xmp, const Path& path, const boost::shared_ptr<EntryDefinition>& entry)
@@ -836,6 +1014,7 @@ std::unique_ptr<Field> MakeField(XMPMetaRef xmp, const Path& path, const boost::
       field = std::make_unique<AltTextField>(xmp, path, entry, hints.multiLine, recent);
       break;
     case FieldKind::kList: field = std::make_unique<ListField>(xmp, path, entry); break;
+    case FieldKind::kStructArray: field = std::make_unique<StructArrayField>(xmp, path, entry); break;
     case FieldKind::kReadOnly: field = std::make_unique<ReadOnlyField>(xmp, path, entry); break;
   }
   field->Widget()->setObjectName(field->Name());

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include <QObject>
@@ -27,6 +28,7 @@ enum class FieldKind {
   kDate,          // date-time editor
   kAltText,       // text with a language selector
   kList,          // item list editor (bag, seq)
+  kStructArray,   // items of a top-level array of structures, each a group
   kReadOnly       // formatted display value
 };
 
@@ -39,8 +41,8 @@ struct FieldHints {
   bool writable = true;  // the provider accepts writes to the path
 };
 
-// The kind of editor for a value; structures and arrays of structures are
-// not fields (the page shows them as groups and read-only lists).
+// The kind of editor for a value; structures are not fields (the page shows
+// them as groups), arrays of structures below the top level are read-only.
 FieldKind KindOf(const ovrametadata::Path& path, const ovrametadata::EntryDefinition& entry,
                  const FieldHints& hints);
 
@@ -63,6 +65,8 @@ class Field : public QObject {
   FieldKind Kind() const { return mKind; }
   const QString& Name() const { return mName; }
   const ovrametadata::Path& GetPath() const { return mPath; }
+  // An item added on save gets its index only then.
+  void SetPath(ovrametadata::Path path) { mPath = std::move(path); }
   bool Edited() const { return mEdited; }
   bool Mixed() const { return mMixed; }
   // Something is stored (or differs between the files).
@@ -72,6 +76,8 @@ class Field : public QObject {
 
   // Writes the edited value into xmp; true when the packet changed there.
   virtual bool Write(XMPMetaRef xmp) = 0;
+  // The paths to name to the update guard after a Write that changed xmp.
+  virtual std::vector<ovrametadata::Path> ChangedPaths() const { return {mPath}; }
   // The texts to remember as recently used after a save.
   virtual QStringList RecentTexts() const { return {}; }
 

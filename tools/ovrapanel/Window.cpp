@@ -262,7 +262,8 @@ bool Window::Save() {
       return false;
     }
     for (Field* field : edited)
-      if (field->Write(*update)) update.AddChange(field->GetPath());
+      if (field->Write(*update))
+        for (const Path& path : field->ChangedPaths()) update.AddChange(path);
   } catch (const std::exception& error) {
     Report(QStringLiteral("Saving failed: %1").arg(QString::fromLocal8Bit(error.what())));
     ok = false;
