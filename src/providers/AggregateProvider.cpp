@@ -7,6 +7,7 @@
 
 #include <ovracore/Strings.h>
 #include <ovraxmp/XMPToolkit.h>
+#include <ovrametadata/ValueEditing.h>
 #include <ovrametadata/Values.h>
 
 namespace ovrametadata {
@@ -21,8 +22,11 @@ void DeletePropertyIfAggregatedIsEmpty(XMPMetaRef aggregate, ovraxmp::XMPMeta& m
   UTF8String value;
   GetValueResult result = ValueAbsent;
   GetValue(aggregate, path, value, &result);
-  if (result == ValueMixed) return;
-  if (value.empty()) member.DeleteProperty(path.namespaceURI, path.description);
+  if (result == ValueMixed || !value.empty()) return;
+  // A structure or an array of structures has no text of its own: it was
+  // cleared only when the aggregate no longer holds it.
+  if (result != ValueFound && HasValue(aggregate, path)) return;
+  member.DeleteProperty(path.namespaceURI, path.description);
 }
 
 // The part of a property path after its prefix ("dc:title" gives "title").

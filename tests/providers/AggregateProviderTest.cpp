@@ -102,6 +102,24 @@ TEST_F(AggregateOverFiles, AClearedValueDeletesThePropertyEverywhere) {
   EXPECT_EQ(FileText(1, note), "b");
 }
 
+TEST_F(AggregateOverFiles, AStructureGivenAsAChangeWasDeletedFromEveryFile) {
+  const Path spot = ovratest::TestPath("Spot"), points = ovratest::TestPath("Points");
+  {
+    MetaDataUpdateAccess access(aggregate);
+    ovraxmp::XMPMeta meta(*access);
+    meta.SetStructField(ovratest::kTestNS, "Spot", ovratest::kTestNS, "X", "1");
+    meta.AppendArrayItem(ovratest::kTestNS, "Points", ovraxmp::kXMP_PropArrayIsOrdered, "",
+                         ovraxmp::kXMP_PropValueIsStruct);
+    meta.SetStructField(ovratest::kTestNS, "Points[1]", ovratest::kTestNS, "Y", "2");
+    access.AddChange(spot);
+    access.AddChange(points);
+  }
+  for (std::size_t i = 0; i < files.size(); ++i) {
+    EXPECT_TRUE(FileHas(i, spot)) << files[i];
+    EXPECT_TRUE(FileHas(i, points)) << files[i];
+  }
+}
+
 TEST_F(AggregateOverFiles, ADeletionRecordIsAppliedToEveryFile) {
   {
     MetaDataUpdateAccess access(aggregate);
